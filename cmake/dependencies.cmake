@@ -1,0 +1,12 @@
+# Everything the daemon and its plain-Linux platform call; all are Debian packages.
+find_package(PkgConfig REQUIRED)
+pkg_check_modules(sqlite3 REQUIRED IMPORTED_TARGET sqlite3)
+pkg_check_modules(jsoncpp REQUIRED IMPORTED_TARGET jsoncpp)
+pkg_check_modules(icu REQUIRED IMPORTED_TARGET icu-uc)
+pkg_check_modules(blkid REQUIRED IMPORTED_TARGET blkid)
+pkg_check_modules(uuid REQUIRED IMPORTED_TARGET uuid)
+if(FERRIX_PLATFORM STREQUAL "host" OR FERRIX_TESTS)
+    pkg_check_modules(mount REQUIRED IMPORTED_TARGET mount)
+    pkg_check_modules(udev REQUIRED IMPORTED_TARGET libudev)
+    pkg_check_modules(inih REQUIRED IMPORTED_TARGET inih)
+endif()
