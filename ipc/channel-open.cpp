@@ -1,0 +1,188 @@
+// Opening and closing a Channel, and the plain transport: a socket descriptor.
+#include <fcntl.h>
+#include <sys/socket.h>
+#include <sys/un.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+
+#include "ipc/channel.h"
+#include "ipc/wait-ready.h"
+#include "utils/error-code.h"
+#include "utils/log.h"
+#include "utils/unique-fd.h"
+
+namespace {
+
+int PlainDescriptor(const void* handle) {
+    return handle != nullptr ? *static_cast<const int*>(handle) : -1;
+}
+
+bool IsPlainInvalid(const void* handle) { return PlainDescriptor(handle) == -1; }
+
+void ClosePlain(void* handle) {
+    const int descriptor = PlainDescriptor(handle);
+    if (shutdown(descriptor, SHUT_RDWR) != 0) {
+        SLOG_DBG("Channel: shutdown: %s\n", std::strerror(errno));
+    }
+    close(descriptor);
+    SLOG_DBG("Channel: socket %d closed\n", descriptor);
+    delete static_cast<int*>(handle);
+}
+
+// 0 when the socket is ready, else the code to return.
+int WaitForSocket(int descriptor, bool for_writing, const timeval& timeout) {
+    for (;;) {
+        const int ready = WaitReady(descriptor, for_writing, timeout);
+        if (ready > 0) return 0;
+        if (ready == 0) {
+            SLOG_DBG("select: timeout\n");
+            return ERR_CONNECTION_TIMEOUT;
+        }
+        if (errno == EINTR) {
+            SLOG_DBG("select: EINTR\n");
+            continue;
+        }
+        if (for_writing) {
+            SLOG_ERR("select: %s\n", std::strerror(errno));
+        } else {
+            SLOG_ERR("select: [%d] %s\n", errno, std::strerror(errno));
+        }
+        return ERR_IO;
+    }
+}
+
+}  // namespace
+
+constinit const Channel::Transport Channel::kPlainTransport = {
+    [](void* handle, void* buffer, size_t length, const timeval& timeout) {
+        return ReadFd(PlainDescriptor(handle), buffer, length, timeout);
+    },
+    [](void* handle, const void* buffer, size_t length, const timeval& timeout) {
+        return WriteFd(PlainDescriptor(handle), buffer, length, timeout);
+    },
+    PlainDescriptor,
+    ClosePlain,
+    IsPlainInvalid,
+};
+
+void Channel::SetFunctions(const Transport& transport) { m_transport = transport; }
+
+ssize_t Channel::ReadFd(int descriptor, void* buffer, size_t length, const timeval& timeout) {
+    if (length == 0) {
+        SLOG_ERR("ReadFd: request 0\n");
+        return ERR_INVALID_ARGUMENT;
+    }
+    if (const int result = WaitForSocket(descriptor, false, timeout); result != 0) return result;
+    const ssize_t count = recv(descriptor, buffer, length, 0);
+    if (count > 0) return count;
+    SLOG_ERR("read: %s\n", std::strerror(count < 0 ? errno : 0));
+    if (count == 0) {
+        SLOG_ERR(
+            "Diagnose: select says the socket is readable but actually we can't read ... "
+            "connection closed?\n");
+    }
+    return ERR_IO;
+}
+
+ssize_t Channel::WriteFd(int descriptor, const void* buffer, size_t length,
+                         const timeval& timeout) {
+    if (const int result = WaitForSocket(descriptor, true, timeout); result != 0) return result;
+    const ssize_t count = send(descriptor, buffer, length, 0);
+    if (count > 0) return count;
+    SLOG_ERR("write: %s\n", std::strerror(count < 0 ? errno : 0));
+    if (count == 0) {
+        SLOG_ERR(
+            "Diagnose: select says the socket is writeable but actually we can't write ... "
+            "connection closed?\n");
+    }
+    return ERR_IO;
+}
+
+void Channel::Adopt(int descriptor) {
+    m_handle = new int(descriptor);
+    ResetRead();
+    ResetWrite();
+}
+
+int Channel::Open(int descriptor, bool tune) {
+    if (!IsClosed()) {
+        SLOG_ERR("Open: Channel already opened [%d]\n", m_transport.get_descriptor(m_handle));
+        SLOG_ERR("Open: %s\n", ErrorText(ERR_INVALID_ARGUMENT));
+        return ERR_INVALID_ARGUMENT;
+    }
+    if (tune) {
+        if (SetLinger(descriptor, 1) != 0) {
+            SLOG_ERR("Open: SetLinger to socket [%d] failed, %s\n", descriptor,
+                     std::strerror(errno));
+            return ERR_SYSTEM;
+        }
+        if (SetNonBlock(descriptor) != 0) {
+            SLOG_ERR("Open: SetNonBlock to socket [%d] failed, %s\n", descriptor,
+                     std::strerror(errno));
+            return ERR_SYSTEM;
+        }
+    }
+    if (descriptor == -1) return ERR_INVALID_ARGUMENT;
+    Adopt(descriptor);
+    SLOG_DBG("Channel: opening socket %d\n", descriptor);
+    return 0;
+}
+
+int Channel::Open(const std::string& path) {
+    if (!IsClosed()) {
+        SLOG_ERR("Open: Channel already opened [%d]\n", m_transport.get_descriptor(m_handle));
+        SLOG_ERR("Open: %s\n", ErrorText(ERR_INVALID_ARGUMENT));
+        return ERR_INVALID_ARGUMENT;
+    }
+    UniqueFd descriptor(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
+    if (!descriptor.IsValid()) {
+        SLOG_ERR("Channel: Can not open socket. %s\n", std::strerror(errno));
+        return ERR_SYSTEM;
+    }
+    sockaddr_un address{};
+    address.sun_family = AF_UNIX;
+    path.copy(address.sun_path, sizeof(address.sun_path) - 1);
+    if (connect(descriptor.Get(), reinterpret_cast<const sockaddr*>(&address), sizeof(address)) !=
+        0) {
+        SLOG_ERR("Channel: Can not connect to server at '%s'. %s\n", path.c_str(),
+                 std::strerror(errno));
+        return ERR_IO;
+    }
+    if (SetNonBlock(descriptor.Get()) != 0) return ERR_SYSTEM;
+    Adopt(descriptor.Release());
+    return 0;
+}
+
+void Channel::Close() {
+    if (IsClosed()) return;
+    if (const int result = FlushWrite(0); result < 0) {
+        SLOG_ERR("FlushWrite: %s\n", ErrorText(result));
+        ResetRead();
+        ResetWrite();
+    }
+    m_transport.close(m_handle);
+    m_handle = nullptr;
+    SetFunctions(kPlainTransport);
+}
+
+int Channel::SetLinger(int descriptor, int seconds) const {
+    const linger value{1, seconds};
+    if (setsockopt(descriptor, SOL_SOCKET, SO_LINGER, &value, sizeof(value)) != 0) {
+        SLOG_ERR("setsockopt: %s\n", std::strerror(errno));
+        return -1;
+    }
+    return 0;
+}
+
+int Channel::SetNonBlock(int descriptor) const {
+    if (descriptor == -1) return -1;
+    const int flags = fcntl(descriptor, F_GETFL);
+    if (flags < 0 ||
+        ((flags & O_NONBLOCK) == 0 && fcntl(descriptor, F_SETFL, flags | O_NONBLOCK) != 0)) {
+        SLOG_ERR("fcntl: %s\n", std::strerror(errno));
+        return -1;
+    }
+    return 0;
+}

@@ -1,0 +1,62 @@
+// Encodes one PObject onto a Channel and decodes one from it.
+//
+// The wire: a value is a tag of one byte and a body; a value ends where its own encoding ends,
+// there is no outer length. Integers are big-endian.
+//   0x00 null     one byte 0x00
+//   0x01 integer  one byte n (1, 2, 4 or 8 when written; 0 to 8 when read), n bytes, unsigned
+//   0x10 string   16-bit length, the bytes; a reader ends the text at the first NUL
+//   0x40 end      closes an array or a map
+//   0x41 array    values, then 0x40
+//   0x42 map      pairs of a string with its tag and a value, in key order, then 0x40
+// A key that begins with '_' is sent without it. Buffers cannot be sent. Binaries (0x30) are not
+// carried: they are refused in both directions.
+//
+// Threads: one thread sends and receives; GetStatus may be called from any.
+// Results: 0; -1 for a value that cannot be sent; ERR_IO when the channel failed; -5 for bytes that
+// are no value. After a failure the connection is out of step and has to be closed; a target of
+// Recv is then partly filled.
+#pragma once
+
+#include <pthread.h>
+
+#include <cstdint>
+#include <string>
+#include <string_view>
+#include <vector>
+
+class Channel;
+class PObject;
+
+class PStream {
+public:
+    PStream() = default;
+    PStream(const PStream&) = delete;
+    PStream& operator=(const PStream&) = delete;
+    ~PStream();
+
+    // Encodes and flushes.
+    [[nodiscard]] int Send(Channel& channel, const PObject& value);
+    // Decodes exactly one value; what the target held before is dropped.
+    [[nodiscard]] int Recv(Channel& channel, PObject& value);
+    // The path of map keys being worked on, and the bytes done and in total of a binary in transit.
+    void GetStatus(std::string& error_path, uint64_t& done, uint64_t& total) const;
+
+private:
+    class Reader;  // stream-reader.h
+    class Writer;  // stream-writer.h
+
+    void PushKey(std::string_view key);
+    void PopKey();
+    [[nodiscard]] std::string ErrorPathLocked() const;
+    [[nodiscard]] int Finish(int result);
+    [[nodiscard]] const char* Indent() const;
+
+    mutable pthread_mutex_t m_mutex = PTHREAD_MUTEX_INITIALIZER;
+    // Under m_mutex. The first m_key_count strings are the keys, outermost first; the others are
+    // kept for their memory.
+    std::vector<std::string> m_error_stack;
+    size_t m_key_count = 0;
+    uint64_t m_total_bytes = 0;  // under m_mutex
+    uint64_t m_done_bytes = 0;   // under m_mutex
+    unsigned m_level = 0;        // of nesting, for the indent of debug lines
+};

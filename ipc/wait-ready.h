@@ -1,0 +1,8 @@
+// Waiting for a descriptor.
+#pragma once
+
+#include <sys/time.h>
+
+// Waits until the descriptor can be read or written, or something is wrong with it.
+// 1: ready; 0: timeout, or a wake without a cause; -1: failure, in errno (EINTR: a signal).
+[[nodiscard]] int WaitReady(int descriptor, bool for_writing, const timeval& timeout);
