@@ -1,0 +1,30 @@
+#include "strategy/destination.h"
+
+#include "strategy/conflict-rename.h"
+#include "strategy/recycle-bin.h"
+#include "strategy/root-check.h"
+#include "utils/error-code.h"
+#include "utils/log.h"
+
+int RenameConflict(const std::string& path, const char* reason, int code) {
+    // The codes of a failed rename are negative: it goes the way of a successful one, and the next
+    // attempt meets the same conflict again.
+    if (ConflictRename(path, "Ferrix", reason) > 0) {
+        SLOG_ERR("Failed to rename file '%s', should retry.", path.c_str());
+        return ERR_SYSTEM;
+    }
+    SLOG_INFO("Rename Destination file success, try copy again");
+    return code;
+}
+
+int ClearTypeConflict(const TaskRunInfo& task, const std::string& path, bool is_dir,
+                      bool is_overwrite) {
+    SLOG_INFO("File '%s' conflict, apply conflict policy %s", path.c_str(),
+              is_overwrite ? "OVERWRITE" : "RENAME");
+    if (!is_overwrite) return RenameConflict(path, "TypeConflict", ERR_DST_TYPE_CONFLICT);
+    if (const int result = CheckTaskRoots(task); result < 0) return result;
+    // Not looked at: what is still in the way shows when the event runs again.
+    static_cast<void>(RecycleBin().RemoveFile(path, is_dir));
+    SLOG_INFO("Conflict Policy is overwrite, remove '%s', try copy again.", path.c_str());
+    return ERR_DST_TYPE_CONFLICT;
+}
