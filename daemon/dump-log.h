@@ -1,0 +1,7 @@
+// Dumps for the debug log.
+#pragma once
+
+#include <string>
+
+// Writes a text of many lines, a log line for each.
+void LogDump(const std::string& text);

@@ -1,0 +1,19 @@
+// ferrixd: copies files between plugged-in storage and the shares of this box.
+#include "daemon/usb-daemon.h"
+#include "utils/log.h"
+
+namespace {
+
+// A first argument is accepted and changes nothing.
+int IgnoreArgument(const char* /*argument*/) { return 0; }
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    USBDaemon daemon;
+    SLOG_INFO("Daemon Starts ...\n");
+    if (argc > 1) IgnoreArgument(argv[1]);
+    daemon.Run();
+    SLOG_INFO("Daemon End ...\n");
+    return 0;
+}
