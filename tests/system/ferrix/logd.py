@@ -1,0 +1,38 @@
+"""Stands in for the log daemon: takes every line sent to /dev/log and keeps it."""
+import os
+import re
+import socket
+import threading
+
+LINE = re.compile(rb"<(\d+)>\w{3} [ \d]\d \d\d:\d\d:\d\d (\w+): (.*)", re.S)
+
+
+class LogDaemon:
+    def __init__(self, path="/dev/log"):
+        self.lines = []
+        self._lock = threading.Lock()
+        self._socket = socket.socket(socket.AF_UNIX, socket.SOCK_DGRAM)
+        self._socket.setsockopt(socket.SOL_SOCKET, socket.SO_RCVBUF, 8 << 20)
+        if os.path.exists(path):
+            os.unlink(path)
+        self._socket.bind(path)
+        os.chmod(path, 0o666)
+        threading.Thread(target=self._run, daemon=True).start()
+
+    def _run(self):
+        while True:
+            data = self._socket.recv(1 << 18)
+            match = LINE.match(data)
+            with self._lock:
+                self.lines.append(os.fsdecode(match[3] if match else data).rstrip("\n"))
+
+    def mark(self):
+        with self._lock:
+            return len(self.lines)
+
+    def since(self, mark=0):
+        with self._lock:
+            return self.lines[mark:]
+
+    def has(self, part, mark=0):
+        return any(part in line for line in self.since(mark))
