@@ -2,8 +2,9 @@
 // Channel with rings of the daemon's size. The transport is memory, so that the system's copying
 // through a socket is left out; WireSocketRoundTrip shows what that adds.
 //
-// The argument says what becomes of the debug lines: 0: a sink takes each finished line and drops it
-// (what the daemon itself pays for a line), 1: they go to the log daemon of this machine, if any.
+// The argument says what becomes of the debug lines: 0: a sink takes each finished line and drops
+// it (what the daemon itself pays for a line), 1: they go to the log daemon of this machine, if
+// any.
 #include <benchmark/benchmark.h>
 #include <sys/socket.h>
 

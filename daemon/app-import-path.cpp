@@ -2,6 +2,7 @@
 #include <list>
 
 #include "daemon/app.h"
+#include "daemon/request-text.h"
 #include "daemon/task-folder.h"
 #include "db/task-db.h"
 #include "ipc/pobject.h"
@@ -34,11 +35,9 @@ int StatInsideShare(const std::string& share_name, const std::string& folder,
 }  // namespace
 
 bool Ferrixd::CheckImportDestPath(const PObject& request, uint64_t own_task_id, PObject& response) {
-    // Up to the first NUL byte: so much is stored and so much names a folder.
-    const std::string share_name = request["hub_share_name"].AsString();
-    const std::string folder_path = request["hub_folder_path"].AsString();
-    return CheckImportDestPath(request["task_type"].AsInt32(), share_name.c_str(),
-                               folder_path.c_str(), own_task_id, response);
+    return CheckImportDestPath(request["task_type"].AsInt32(),
+                               RequestText(request, "hub_share_name"),
+                               RequestText(request, "hub_folder_path"), own_task_id, response);
 }
 
 bool Ferrixd::CheckImportDestPath(int task_type, const std::string& share_name,

@@ -4,6 +4,7 @@
 
 #include "daemon/app.h"
 #include "daemon/dump-log.h"
+#include "daemon/request-text.h"
 #include "daemon/task-entry-loader.h"
 #include "daemon/usb-matcher.h"
 #include "db/task-db.h"
@@ -63,9 +64,9 @@ void AddTaskEntry(const TaskInfo& task, const std::string& usb_share_path) {
     SLOG_INFO("Add task '%llu'\n", Llu(task.id));
 }
 
-// True when the device was loaded and has gone since without a word: another one may stand on its
-// path by now, or the same one on another path.
-bool IsStale(const std::list<TaskRunInfo>& tasks) {
+// True when the device of a loaded task has gone: another one may stand on its path by now, or the
+// same one on another path.
+bool IsAnyGone(const std::list<TaskRunInfo>& tasks) {
     for (const TaskRunInfo& task : tasks) {
         if (!SDK::IsDevicePresent(task.device_mount_path, task.device_identity)) return true;
     }
@@ -120,8 +121,8 @@ int Ferrixd::LoadUSBTaskEntryByUSBID(uint64_t usb_id, const std::string& usb_sha
 }
 
 int Ferrixd::HandleVolumeMount(const PObject& request) {
-    const std::string usb_share_path = request["mountpoint"].AsString();
-    const std::string device = request["device"].AsString();
+    const std::string usb_share_path = RequestText(request, "mountpoint");
+    const std::string device = RequestText(request, "device");
     if (usb_share_path.empty() || device.empty()) {
         SLOG_ERR("HandleVolumeMount: Invalid parameter\n");
         return -1;
@@ -142,7 +143,7 @@ int Ferrixd::HandleVolumeMount(const PObject& request) {
         SLOG_WARN("NO matched usb info for '%s'\n", device.c_str());
         return -1;
     }
-    DropStaleEntries(usb_info.id);
+    DropStaleEntries(usb_info.id, usb_share_path);
     if (LoadUSBTaskEntryByUSBID(usb_info.id, usb_share_path) < 0) {
         SLOG_ERR("Failed to load usb and task entry for '%llu', '%s', ignore\n", Llu(usb_info.id),
                  usb_share_path.c_str());
@@ -168,11 +169,15 @@ void Ferrixd::EnqueueRunnableTasks(uint64_t usb_id) {
 }
 
 // A device that was pulled out is not announced. When it comes back its old entries would stand for
-// the device that has gone, and no task of them could run.
-void Ferrixd::DropStaleEntries(uint64_t usb_id) {
+// the device that has gone, and no task of them could run. The entry of a device whose tasks could
+// not be loaded outlives its unmounting and is worth nothing on another path.
+void Ferrixd::DropStaleEntries(uint64_t usb_id, const std::string& usb_share_path) {
+    USBRunInfo usb;
+    if (TaskEntryHandler::GetInstance().GetUSBEntry(usb_id, usb) < 0) return;
     std::list<TaskRunInfo> tasks;
     TaskEntryHandler::GetInstance().ListTaskEntriesByUSB(usb_id, tasks);
-    if (!IsStale(tasks)) return;
+    if (tasks.empty() && usb.usb_share_path != usb_share_path) RemoveUSB(usb_id);
+    if (!IsAnyGone(tasks)) return;
     SLOG_NOTICE("The device of usb id '%llu' has been replaced, its entries are loaded anew\n",
                 Llu(usb_id));
     DropTaskEntries(usb_id);
@@ -187,8 +192,8 @@ void Ferrixd::DropTaskEntries(uint64_t usb_id) {
 }
 
 int Ferrixd::HandleVolumeUnmount(const PObject& request) {
-    const std::string usb_share_path = request["mountpoint"].AsString();
-    const std::string device = request["device"].AsString();
+    const std::string usb_share_path = RequestText(request, "mountpoint");
+    const std::string device = RequestText(request, "device");
     if (usb_share_path.empty() || device.empty()) {
         SLOG_ERR("HandleVolumeUnmount: Invalid parameter\n");
         return -1;

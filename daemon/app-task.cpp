@@ -4,6 +4,7 @@
 
 #include "daemon/app.h"
 #include "daemon/dump-log.h"
+#include "daemon/request-text.h"
 #include "daemon/task-folder.h"
 #include "daemon/usb-matcher.h"
 #include "db/log-info.h"
@@ -27,21 +28,13 @@ constexpr int FOUND = 1;
 constexpr uint64_t NO_TASK = 0;
 constexpr int64_t NO_SCHEDULE = -1;
 
-// A text of the request up to its first NUL byte: that much of it is stored, and that much is the
-// name of a file.
-std::string Text(const PObject& request, const char* key) {
-    std::string text = request[key].AsString();
-    text.resize(text.find('\0') == std::string::npos ? text.size() : text.find('\0'));
-    return text;
-}
-
 USBInfo ReadUSBInfo(const PObject& request) {
     USBInfo usb;
-    usb.uuid = Text(request, "uuid");
+    usb.uuid = RequestText(request, "uuid");
     usb.run_when_plug_in = request["run_when_plug_in"].AsBool();
     usb.eject_when_task_done = request["eject_when_task_done"].AsBool();
-    usb.producer = Text(request, "producer");
-    usb.product = Text(request, "product");
+    usb.producer = RequestText(request, "producer");
+    usb.product = RequestText(request, "product");
     return usb;
 }
 
@@ -49,11 +42,11 @@ TaskInfo ReadTaskInfo(const PObject& request, uint64_t usb_id) {
     TaskInfo task;
     task.usb_id = usb_id;
     task.is_enable = true;
-    task.task_name = Text(request, "task_name");
+    task.task_name = RequestText(request, "task_name");
     task.task_type = request["task_type"].AsInt32();
-    task.usb_folder_path = Text(request, "usb_folder_path");
-    task.hub_folder_path = Text(request, "hub_folder_path");
-    task.hub_share_name = Text(request, "hub_share_name");
+    task.usb_folder_path = RequestText(request, "usb_folder_path");
+    task.hub_folder_path = RequestText(request, "hub_folder_path");
+    task.hub_share_name = RequestText(request, "hub_share_name");
     task.copy_strategy = request["copy_strategy"].AsInt32();
     task.keep_dir_structure = request["keep_dir_structure"].AsBool();
     task.smart_create_date_dir = request["smart_create_date_dir"].AsBool();
@@ -81,7 +74,7 @@ int Ferrixd::AddTask(const PObject& request, PObject& response) {
         return -1;
     }
     if (!CheckImportDestPath(request, NO_TASK, response)) return -1;
-    ReleaseDefaultTask(Text(request, "uuid"));
+    ReleaseDefaultTask(RequestText(request, "uuid"));
     TaskInfo task_info;
     if (AddTaskRows(request, task_info, response) < 0) return -1;
     if (SetUpTask(request, task_info, response) < 0) return -1;
@@ -142,17 +135,17 @@ int Ferrixd::SetUpTask(const PObject& request, const TaskInfo& task_info, PObjec
         SetResponseError(RESPONSE_OTHER, "Failed to WriteFilterSetting", response);
         return -1;
     }
-    if (LoadUSBTaskEntryByUSBID(task_info.usb_id, Text(request, "usb_share_path")) < 0) {
+    if (LoadUSBTaskEntryByUSBID(task_info.usb_id, RequestText(request, "usb_share_path")) < 0) {
         SLOG_ERR("Failed to add usb entry '%llu' and task entry\n", Llu(task_info.usb_id));
         SetResponseError(RESPONSE_OTHER, "Failed to LoadUSBTaskEntryByUSBID", response);
         return -1;
     }
-    USBMatcher::GetInstance().RemoveByUUID(Text(request, "uuid"));
+    USBMatcher::GetInstance().RemoveByUUID(RequestText(request, "uuid"));
     return 0;
 }
 
 int Ferrixd::ScheduleTask(const PObject& request, TaskInfo& task_info, PObject& response) {
-    const std::string schedule = Text(request, "schedule_json_str");
+    const std::string schedule = RequestText(request, "schedule_json_str");
     if (!CreateSchedule(task_info.id, task_info.task_type, task_info.task_name,
                         request["schedule_enabled"].AsBool(), schedule, task_info.schedule_id)) {
         SLOG_ERR("Failed to create schedule [%s]", schedule.c_str());

@@ -15,7 +15,8 @@ public:
 
 private:
     friend class DbLock;
-    pthread_mutex_t m_mutex;
+    // Good as it stands, should the system refuse to make it.
+    pthread_mutex_t m_mutex = PTHREAD_MUTEX_INITIALIZER;
 };
 
 // Holds the lock for the length of a block.

@@ -60,7 +60,7 @@ constexpr char kMaxRotateCount[] = "100000";
 
 uint64_t Number(const char* text) { return static_cast<uint64_t>(strtol(text, nullptr, 10)); }
 
-// A part of a LIKE pattern that matches `keyword` literally; quotes are the caller's care.
+// A part of a LIKE pattern; quotes and backslashes are the caller's care.
 std::string EscapeForLike(const std::string& keyword) {
     std::string escaped;
     for (const char c : keyword) {

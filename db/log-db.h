@@ -23,7 +23,9 @@ struct LogFilter {
     uint32_t offset = 0;     // 0: none; refused by the database without a limit
     uint32_t from_time = 0;  // seconds since the epoch, included; 0: open
     uint32_t to_time = 0;
-    // A part of the stored parameter text, taken literally; empty: none. It must not hold a single
+    // A part of the stored parameter text, which is JSON: characters above ASCII are escapes there.
+    // "%" and "_" are taken literally, ASCII letters match in either case, and a backslash takes
+    // the next character literally: it is written twice. Empty: none. It must not hold a single
     // quote: it goes into the statement as it stands.
     std::string keyword;
     int log_type = 0;                  // a LogDB::LOG_TYPE; anything else: all
@@ -59,6 +61,7 @@ public:
 
     // The number of rows kept, 5 to 100000. Lowering it removes the oldest rows at once.
     [[nodiscard]] int SetRotateCount(uint64_t count);
+    // A file without the setting gives 0, and keeps all rows.
     [[nodiscard]] int GetRotateCount(uint64_t& count);
 
     // A limit or offset in the filter counts the one row of the answer, not the rows selected.

@@ -22,8 +22,8 @@ time_t NowSeconds() {
 
 Channel::Channel(size_t capacity)
     : m_transport(kPlainTransport),
-      m_write_ring(std::make_unique<uint8_t[]>(capacity)),
-      m_read_ring(std::make_unique<uint8_t[]>(capacity)),
+      m_write_ring(std::make_unique_for_overwrite<uint8_t[]>(capacity)),
+      m_read_ring(std::make_unique_for_overwrite<uint8_t[]>(capacity)),
       m_capacity(capacity) {}
 
 Channel::~Channel() { Channel::Close(); }

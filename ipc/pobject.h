@@ -11,7 +11,6 @@
 #include <concepts>
 #include <cstddef>
 #include <cstdint>
-#include <functional>
 #include <map>
 #include <string>
 #include <string_view>
@@ -32,8 +31,7 @@ public:
     };
 
     using array_type = std::vector<PObject>;
-    // Keys in byte-wise order.
-    // The order of std::less, without a call for two keys that differ early.
+    // Byte-wise order, found without a call for two keys that differ at once.
     struct KeyLess {
         using is_transparent = void;
         bool operator()(std::string_view a, std::string_view b) const {

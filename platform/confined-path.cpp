@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <linux/openat2.h>
 #include <pthread.h>
+#include <sys/stat.h>
 #include <sys/syscall.h>
 #include <unistd.h>
 
@@ -12,6 +13,7 @@
 #include <climits>
 #include <map>
 #include <optional>
+#include <vector>
 
 #include "utils/mutex-lock.h"
 
@@ -23,6 +25,25 @@ pthread_mutex_t g_roots_mutex = PTHREAD_MUTEX_INITIALIZER;
 std::map<std::string, int, std::less<>>& Roots() {
     static auto* roots = new std::map<std::string, int, std::less<>>;
     return *roots;
+}
+
+// Opens a folder on the way. Not with O_DIRECTORY: that says ENOTDIR for a link and a file alike,
+// and a second look to tell them apart may find something else already.
+UniqueFd OpenStep(int dir_fd, const char* name) {
+    UniqueFd fd(openat(dir_fd, name, O_PATH | O_NOFOLLOW | O_CLOEXEC));
+    struct stat st {};
+    if (!fd.IsValid() || fstat(fd.Get(), &st) != 0) return {};
+    if (S_ISDIR(st.st_mode)) return fd;
+    errno = S_ISLNK(st.st_mode) ? ELOOP : ENOTDIR;
+    return {};
+}
+
+UniqueFd OpenLast(int dir_fd, const char* name, int flags, mode_t mode) {
+    UniqueFd fd(openat(dir_fd, name, flags | O_NOFOLLOW | O_CLOEXEC, mode));
+    if (fd.IsValid() || errno != ENOTDIR) return fd;
+    char target = 0;
+    errno = readlinkat(dir_fd, name, &target, 1) >= 0 ? ELOOP : ENOTDIR;
+    return {};
 }
 
 // Before Linux 5.6: one component at a time.
@@ -40,17 +61,9 @@ UniqueFd OpenStepwise(int dir_fd, std::string_view relative, int flags, mode_t m
         }
         const bool is_last =
             end == std::string_view::npos || relative.find_first_not_of('/', end) == relative.npos;
-        const int step_flags = is_last ? flags : O_PATH | O_DIRECTORY;
-        UniqueFd next(openat(at, component.c_str(), step_flags | O_NOFOLLOW | O_CLOEXEC, mode));
-        // A link in the middle answers ENOTDIR to O_DIRECTORY: tell it apart from a plain file.
-        if (!next.IsValid() && errno == ENOTDIR) {
-            char target = 0;
-            if (readlinkat(at, component.c_str(), &target, 1) >= 0)
-                errno = ELOOP;
-            else
-                errno = ENOTDIR;
-        }
-        if (!next.IsValid() || is_last) return next;
+        if (is_last) return OpenLast(at, component.c_str(), flags, mode);
+        UniqueFd next = OpenStep(at, component.c_str());
+        if (!next.IsValid()) return next;
         current = std::move(next);
         at = current.Get();
         relative.remove_prefix(end);
@@ -78,6 +91,44 @@ UniqueFd OpenPiece(int dir_fd, std::string_view relative, int flags, mode_t mode
         return OpenStepwise(dir_fd, relative, flags, mode);
     }
 }
+
+// The folders that the scopes of a thread keep open.
+class KeptFolders {
+public:
+    static bool IsOn() { return s_depth > 0; }
+    static void Enter() { ++s_depth; }
+    static void Leave() {
+        if (--s_depth == 0) s_folders.clear();
+    }
+    static int Find(std::string_view root, std::string_view folder) {
+        for (const Folder& kept : s_folders) {
+            if (kept.root_size == root.size() && kept.path == folder) return kept.fd.Get();
+        }
+        return -1;
+    }
+    // Takes `fd` over when there is room; returns what is to stand as base of the place. Nothing is
+    // thrown out for a new one: a place may still use it.
+    static int Keep(std::string_view root, std::string_view folder, UniqueFd& fd) {
+        if (s_folders.size() >= kMost) return AT_FDCWD;
+        const int number = fd.Get();
+        s_folders.push_back({root.size(), std::string(folder), std::move(fd)});
+        return number;
+    }
+
+private:
+    struct Folder {
+        size_t root_size;  // the same folder below another root is another way there
+        std::string path;
+        UniqueFd fd;
+    };
+    static constexpr size_t kMost = 8;  // source, destination, and the folders above them
+
+    static thread_local int s_depth;
+    static thread_local std::vector<Folder> s_folders;
+};
+
+thread_local int KeptFolders::s_depth = 0;
+thread_local std::vector<KeptFolders::Folder> KeptFolders::s_folders;
 
 }  // namespace
 
@@ -151,15 +202,27 @@ void PathPlace::Reach(std::string_view root, const std::string& path) {
         m_error = EXDEV;
         return;
     }
-    // Not kept open between calls: an open folder would hold a device that is to be unmounted.
+    const auto folder_path = std::string_view(path).substr(0, root.size() + folder.size() + 1);
+    if (const int kept = KeptFolders::Find(root, folder_path); kept >= 0) {
+        m_base = kept;
+        return;
+    }
     UniqueFd base(open(std::string(root).c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
     if (base.IsValid() && folder.empty()) {
         m_dir = std::move(base);
     } else if (base.IsValid()) {
         m_dir = OpenBeneath(base.Get(), folder, O_PATH | O_DIRECTORY);
     }
-    if (!m_dir.IsValid()) m_error = errno;
+    if (!m_dir.IsValid()) {
+        m_error = errno;
+    } else if (KeptFolders::IsOn()) {
+        m_base = KeptFolders::Keep(root, folder_path, m_dir);
+    }
 }
+
+PathPlaceScope::PathPlaceScope() { KeptFolders::Enter(); }
+
+PathPlaceScope::~PathPlaceScope() { KeptFolders::Leave(); }
 
 // A path that no single call takes: its folders are opened in pieces, links followed as usual.
 void PathPlace::ReachLong(const std::string& path) {

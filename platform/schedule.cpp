@@ -72,7 +72,9 @@ UniqueEntry LoadEntry(int64_t schedule_id) {
         SLOG_ERR("KELDSchedTaskAlloc() failed.\n");
         return nullptr;
     }
-    if (KELDSchedTaskLoad(static_cast<int>(schedule_id), entry.get()) < 0) {
+    // An id that is cut to an int would be that of another entry.
+    const int id = static_cast<int>(schedule_id);
+    if (id != schedule_id || KELDSchedTaskLoad(id, entry.get()) < 0) {
         SLOG_ERR("KELDSchedTaskLoad() failed.\n");
         return nullptr;
     }

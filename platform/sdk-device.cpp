@@ -11,6 +11,7 @@
 #include <string_view>
 
 #include "platform/sdk-mutex.h"
+#include "platform/utility.h"
 #include "utils/log.h"
 #include "utils/per-device-value.h"
 #include "utils/unique-fd.h"
@@ -25,14 +26,6 @@ constexpr int PULL_OUT_FLAGS = 4;
 
 using UniqueProbe = std::unique_ptr<std::remove_pointer_t<blkid_probe>, FreeWith<blkid_free_probe>>;
 using UniqueVolumes = std::unique_ptr<KELDMountVolInfo, FreeWith<KELDMountVolInfoFree>>;
-
-// Byte by byte for ASCII alone: what a uuid is does not hang on the locale.
-std::string LowerCase(std::string text) {
-    for (char& c : text) {
-        if (c >= 'A' && c <= 'Z') c = static_cast<char>(c - 'A' + 'a');
-    }
-    return text;
-}
 
 // The uuid of the file system as it is written there; empty when it has none.
 std::string ProbeUUID(blkid_probe probe) {
@@ -95,7 +88,7 @@ int GetUUID(const std::string& usb_share_path, const std::string& dev_path, std:
     }
     const std::string blk_uuid = ProbeUUID(probe.get());
     if (!blk_uuid.empty()) {
-        uuid = LowerCase(blk_uuid);
+        uuid = ToLower(blk_uuid);
         SLOG_DBG("blk_uuid = %s, uuid = %s\n", blk_uuid.c_str(), uuid.c_str());
         return 0;
     }
@@ -105,7 +98,7 @@ int GetUUID(const std::string& usb_share_path, const std::string& dev_path, std:
                  usb_share_path.c_str());
         return -1;
     }
-    uuid = LowerCase(std::move(key_file_uuid));
+    uuid = ToLower(key_file_uuid);
     return 0;
 }
 

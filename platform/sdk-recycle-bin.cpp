@@ -31,6 +31,7 @@ constexpr mode_t EVERYONE_MODE = 0777;
 constexpr mode_t ICON_FILE_MODE = 0666;  // whoever may enter the bin may change its icon
 
 // What desktop clients read to show the folder as a recycle bin.
+constexpr const char* ICON_FILE = "desktop.ini";
 constexpr std::string_view ICON_FILE_TEXT =
     "[.ShellClassInfo]\n"
     "IconFile=%SystemRoot%\\system32\\SHELL32.dll\n"
@@ -43,28 +44,32 @@ int SetArchiveBits(const std::string& path, int bits) {
     return -1;
 }
 
-int SetBinPermission(const std::string& path, bool admin_only) {
+int SetBinPermission(int bin_fd, const std::string& path, bool admin_only) {
     if (IsAclSupported(path)) return SetRecycleBinPermission(path, admin_only);
-    if (chmod(path.c_str(), admin_only ? ADMIN_ONLY_MODE : EVERYONE_MODE) != 0) return -1;
-    return chown(path.c_str(), 0, 0);
+    if (fchmod(bin_fd, admin_only ? ADMIN_ONLY_MODE : EVERYONE_MODE) != 0) return -1;
+    return fchown(bin_fd, 0, 0);
 }
 
-int WriteIconFile(const std::string& path) {
-    UniqueFd fd(open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_NOFOLLOW | O_CLOEXEC, 0644));
+int WriteIconFile(int bin_fd, const std::string& bin) {
+    const std::string path = bin + "/" + ICON_FILE;
+    UniqueFd fd(
+        openat(bin_fd, ICON_FILE, O_WRONLY | O_CREAT | O_TRUNC | O_NOFOLLOW | O_CLOEXEC, 0644));
     if (!fd.IsValid()) {
         SLOG_ERR("Failed to open file '%s'\n", path.c_str());
         return -1;
     }
     const ssize_t written = write(fd.Get(), ICON_FILE_TEXT.data(), ICON_FILE_TEXT.size());
-    if (written != static_cast<ssize_t>(ICON_FILE_TEXT.size()) || fd.Close() != 0) {
+    if (written != static_cast<ssize_t>(ICON_FILE_TEXT.size())) {
         SLOG_ERR("Failed to write file '%s'\n", path.c_str());
         return -1;
     }
     if (SetArchiveBits(path, ICON_FILE_ARCHIVE_BITS) < 0) return -1;
-    if (chmod(path.c_str(), ICON_FILE_MODE) != 0) {
+    if (fchmod(fd.Get(), ICON_FILE_MODE) != 0) {
         SLOG_WARN("chmod(%s): %s\n", path.c_str(), strerror(errno));
     }
-    return 0;
+    if (fd.Close() == 0) return 0;
+    SLOG_ERR("Failed to write file '%s'\n", path.c_str());
+    return -1;
 }
 
 }  // namespace
@@ -77,7 +82,7 @@ int SetRecycleBinPermission(const std::string& path, bool admin_only) {
                             true,
                             ACL_LEVEL};
     if (WriteAcl(path, {entry}) < 0) return -1;
-    return chown(path.c_str(), 0, 0) == 0 ? 0 : -1;
+    return lchown(path.c_str(), 0, 0);
 }
 
 int CreateRecycleBin(const std::string& path, bool admin_only) {
@@ -92,11 +97,14 @@ int CreateRecycleBin(const std::string& path, bool admin_only) {
         return -1;
     }
     if (SetArchiveBits(path, BIN_ARCHIVE_BITS) < 0) return -1;
-    if (SetBinPermission(path, admin_only) < 0) {
+    // A user of the share may put a link in its place meanwhile: what is written goes into this
+    // folder.
+    const UniqueFd bin(open(path.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+    if (!bin.IsValid() || SetBinPermission(bin.Get(), path, admin_only) < 0) {
         SLOG_ERR("Failed to SetRecycleBinPermission\n");
         return -1;
     }
-    return WriteIconFile(path + "/desktop.ini");
+    return WriteIconFile(bin.Get(), path);
 }
 
 }  // namespace SDK

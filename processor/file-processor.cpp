@@ -12,6 +12,7 @@
 #include "strategy/create-handler.h"
 #include "strategy/remove-handler.h"
 #include "strategy/scan-handler.h"
+#include "utils/confined-path.h"
 #include "utils/error-code.h"
 #include "utils/file-op.h"
 #include "utils/log.h"
@@ -87,6 +88,7 @@ int FileProcessor::PrepareEvent() {
 }
 
 int FileProcessor::Dispatch() {
+    const PathPlaceScope scope;
     const Event& event = m_context.event;
     if (event.IsScan()) return HandleScan();
     switch (event.type) {

@@ -66,9 +66,11 @@ bool ScanHandler::IsUnproven(const FileListEntry& /*dst*/) { return false; }
 int ScanHandler::GenerateEvent(const FileList& src_list, const FileList& dst_list) {
     FileListIterator src = src_list.begin();
     FileListIterator dst = dst_list.begin();
+    const FileListIterator src_end = src_list.end();
+    const FileListIterator dst_end = dst_list.end();
     while (true) {
-        const bool has_src = src != src_list.end();
-        const bool has_dst = dst != dst_list.end();
+        const bool has_src = src != src_end;
+        const bool has_dst = dst != dst_end;
         if (!has_src && !has_dst) return ERR_SUCCESS;
         if (IsAborted()) {
             SLOG_WARN("GenerateEvent: user stopped");

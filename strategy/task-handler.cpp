@@ -31,17 +31,24 @@ const std::string& FlushPath(const TaskRunInfo& task) {
 
 bool IsFlushed(const TaskRunInfo& task) {
     const std::string& path = FlushPath(task);
-    if (FSSyncFileSystem(path) == 0) return true;
+    SLOG_DBG("TaskHandler: flush '%s' begins", path.c_str());
+    if (FSSyncFileSystem(path) == 0) {
+        SLOG_DBG("TaskHandler: flush '%s' done", path.c_str());
+        return true;
+    }
     SLOG_ERR("Failed to flush file system of '%s' for task '%llu'", path.c_str(),
              Llu(task.task_id));
     return false;
 }
 
+// Whether a flush that was reported good has reached the disk: not when the destination is gone.
+bool IsDestinationThere(int roots) { return roots == ERR_SUCCESS || roots == ERR_SRC_ROOT_MISS; }
+
 // The run was broken off: what is on the disk by now need not be copied again. A file may still be
 // under way, so that the record stays, from the start of the flush on.
 void KeepInterruptedRun(const TaskRunInfo& task) {
     const int64_t flush_start = time(nullptr);
-    if (!IsFlushed(task)) return;
+    if (!IsFlushed(task) || !IsDestinationThere(CheckTaskRoots(task))) return;
     if (UnprovenRun(task.task_id).KeepSince(flush_start) < 0) {
         SLOG_WARN("Copies of task '%llu' will be made again", Llu(task.task_id));
     }
@@ -53,7 +60,7 @@ int FinishRun(const TaskRunInfo& task) {
     const bool is_flushed = IsFlushed(task);
     const int roots = CheckTaskRoots(task);
     if (!is_flushed) return roots < 0 ? roots : ERR_IO;
-    if (roots < 0 && roots != ERR_SRC_ROOT_MISS) return roots;  // the flush reached nothing
+    if (!IsDestinationThere(roots)) return roots;
     const int outcome = Ferrix::ErrorHandler::GetInstance().Get(task.task_id);
     if (UnprovenRun(task.task_id).End(roots == ERR_SUCCESS && outcome == ERR_SUCCESS) < 0) {
         SLOG_WARN("Copies of task '%llu' will be made again", Llu(task.task_id));

@@ -44,10 +44,22 @@ private:
 // For tests: false takes the way of kernels before 5.6, one component at a time.
 void ConfinedPathUseOpenat2(bool is_used);
 
+// While one lives, its thread opens each folder that a PathPlace needs only once: the calls for one
+// file go to the same two folders again and again. The folders stay open until the outermost scope
+// of the thread ends, so a scope is as short as the work on one file: an open folder holds a device
+// that is to be unmounted. A folder that is moved meanwhile is still the one that was checked.
+class PathPlaceScope {
+public:
+    PathPlaceScope();
+    ~PathPlaceScope();
+    PathPlaceScope(const PathPlaceScope&) = delete;
+    PathPlaceScope& operator=(const PathPlaceScope&) = delete;
+};
+
 // Where a file system call on `path` has to be made: the open folder that holds the last component,
 // and that component's name, for the ...at() calls with AT_SYMLINK_NOFOLLOW or O_NOFOLLOW.
 // Below no registered root, and for a root itself, this is AT_FDCWD with the whole path, unless
-// that is longer than one call takes.
+// that is longer than one call takes. Must not outlive the PathPlaceScope it was made in.
 class PathPlace {
 public:
     explicit PathPlace(const std::string& path);
@@ -72,7 +84,7 @@ private:
     void ReachLong(const std::string& path);
 
     UniqueFd m_dir;
-    int m_base;
+    int m_base;  // AT_FDCWD, or a folder that the scope keeps open
     int m_error = 0;
     bool m_is_confined = false;
     std::string m_name;

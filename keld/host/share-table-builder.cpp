@@ -140,6 +140,7 @@ private:
         ShareEntry share;
         share.name = name;
         share.path = path;
+        share.isFolder = true;
         m_table->shares.push_back(std::move(share));
     }
 

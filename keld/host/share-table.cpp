@@ -1,5 +1,7 @@
 #include "host/share-table.h"
 
+#include <sys/stat.h>
+
 #include <mutex>
 
 #include "host/host-cache.h"
@@ -37,6 +39,29 @@ void TellClashes(Cache& cache) {
     for (const std::string& path : cache.clashes) {
         SLOG_WARN("'%s' is no share: another volume has a share of that name\n", path.c_str());
     }
+}
+
+// Takes the configuration and the mounts of now; false when the table was made from others.
+bool IsInForceLocked(Cache& cache) {
+    auto conf = CurrentHostConf();
+    auto mounts = CurrentMounts();
+    if (cache.table && conf == cache.conf && mounts == cache.mounts) return true;
+    cache.conf = std::move(conf);
+    cache.mounts = std::move(mounts);
+    return false;
+}
+
+void RebuildLocked(Cache& cache) {
+    cache.folders.clear();
+    cache.table = BuildShareTable(*cache.conf, cache.mounts.get(), [&](const std::string& folder) {
+        cache.folders.push_back({folder, FileStamp::Take(folder)});
+    });
+    TellClashes(cache);
+}
+
+bool IsPlainFolder(const std::string& path) {
+    struct stat info {};
+    return lstat(path.c_str(), &info) == 0 && S_ISDIR(info.st_mode);
 }
 
 bool HaveFoldersChanged(const Cache& cache) {
@@ -82,18 +107,21 @@ const VolumeEntry* ShareTable::FindVolume(std::string_view path) const {
 std::shared_ptr<const ShareTable> CurrentShares() {
     Cache& cache = TheCache();
     const std::lock_guard lock(cache.mutex);
-    auto conf = CurrentHostConf();
-    auto mounts = CurrentMounts();
-    if (cache.table && conf == cache.conf && mounts == cache.mounts && !HaveFoldersChanged(cache)) {
+    if (!IsInForceLocked(cache) || HaveFoldersChanged(cache)) RebuildLocked(cache);
+    return cache.table;
+}
+
+std::shared_ptr<const ShareTable> CurrentSharesFor(std::string_view path) {
+    Cache& cache = TheCache();
+    const std::lock_guard lock(cache.mutex);
+    if (!IsInForceLocked(cache)) {
+        RebuildLocked(cache);
         return cache.table;
     }
-    cache.conf = std::move(conf);
-    cache.mounts = std::move(mounts);
-    cache.folders.clear();
-    cache.table = BuildShareTable(*cache.conf, cache.mounts.get(), [&](const std::string& folder) {
-        cache.folders.push_back({folder, FileStamp::Take(folder)});
-    });
-    TellClashes(cache);
+    // Folders of a volume are one level deep: no new one can come between this share and the path.
+    const ShareEntry* share = cache.table->FindByPath(path);
+    const bool isThere = share != nullptr && (!share->isFolder || IsPlainFolder(share->path));
+    if (!isThere && HaveFoldersChanged(cache)) RebuildLocked(cache);
     return cache.table;
 }
 
@@ -106,7 +134,7 @@ void DropShareTable() {
 }
 
 std::optional<std::string> ShareRootOf(const std::string& path) {
-    const auto table = CurrentShares();
+    const auto table = CurrentSharesFor(path);
     const ShareEntry* share = table->FindByPath(path);
     if (share == nullptr) return std::nullopt;
     return share->path;

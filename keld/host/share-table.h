@@ -25,6 +25,7 @@ struct ShareEntry {
     bool recycleBinAdminOnly = false;
     bool mountPoint = false;  // counts as locked while nothing is mounted on its path
     bool isDevice = false;    // a plugged-in device
+    bool isFolder = false;    // a share only because it is a folder of a volume
     std::string devicePath;   // of a device: "/dev/sdb1"
 };
 
@@ -43,6 +44,9 @@ struct ShareTable {
 
 // The table as of now; never null.
 [[nodiscard]] std::shared_ptr<const ShareTable> CurrentShares();
+// The same for those who ask only for the share that holds `path`: other folders of the volumes are
+// not looked at as long as that share is still there. It is asked for each file.
+[[nodiscard]] std::shared_ptr<const ShareTable> CurrentSharesFor(std::string_view path);
 // Forgets what was read.
 void DropShareTable();
 

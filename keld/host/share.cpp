@@ -69,7 +69,7 @@ void KELDShareFree(KELDShare* share) { delete static_cast<ShareRecord*>(share); 
 int KELDShareNamePathGet(const char* path, char* name, size_t name_size, char* share_path,
                          size_t share_path_size) {
     if (path == nullptr || path[0] != '/') return Fail(KELDERR_INVALID_ARGUMENT);
-    const auto table = CurrentShares();
+    const auto table = keld_host::CurrentSharesFor(path);
     const ShareEntry* entry = table->FindByPath(path);
     if (entry == nullptr) return Fail(KELDERR_SRC_MISS);
     const bool isNameFilled = keld_host::FillBuffer(entry->name, name, name_size);
@@ -79,7 +79,7 @@ int KELDShareNamePathGet(const char* path, char* name, size_t name_size, char* s
 
 int KELDShareBinPathGet(const char* path, char* bin_path, size_t size) {
     if (path == nullptr || path[0] != '/') return Fail(KELDERR_INVALID_ARGUMENT);
-    const auto table = CurrentShares();
+    const auto table = keld_host::CurrentSharesFor(path);
     const ShareEntry* entry = table->FindByPath(path);
     if (entry == nullptr) return Fail(KELDERR_SRC_MISS);
     return keld_host::FillBuffer(entry->path + "/#recycle", bin_path, size)

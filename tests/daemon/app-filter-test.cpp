@@ -231,11 +231,12 @@ TEST_F(FilterSettingTest, AnEntryWithoutAFilterIsAnError) {
 
 TEST_F(FilterSettingTest, AListThatCannotBeLoadedAgainIsAnError) {
     for (const char* which : {"black", "white"}) {
-        // The file turns into a folder between its writing and its loading: at the third time that
-        // its path is asked for there is no going back.
+        // The file goes between its writing and its loading: three paths are made for the writing,
+        // the fourth and the fifth for the loading.
         const std::string file = File(std::string(which) + "list.filter");
-        m_fake.OnCall("KLIBCFileGetKeyValue", [&, calls = 0]() mutable {
-            const int load = which == std::string("black") ? 4 : 5;
+        const int load = which == std::string("black") ? 4 : 5;
+        int calls = 0;
+        m_fake.OnCall("KLIBCFileGetKeyValue", [&calls, &file, load] {
             if (++calls != load) return;
             ASSERT_EQ(0, unlink(file.c_str()));
         });

@@ -203,6 +203,20 @@ TEST_F(MountTest, ADeviceThatWasPulledIsLoadedAnewWhenItComesBack) {
     EXPECT_THAT(LoadedDevices(), SizeIs(1));
 }
 
+TEST_F(MountTest, AnEntryLeftFromAnotherPathIsReplaced) {
+    AddShare("music");
+    const uint64_t task_id = AddUnloadedTask("a", "u-1");
+    ChangeTask(task_id, [](TaskInfo& task) { task.hub_share_name = "gone"; });
+    ASSERT_EQ(0, PostMount("a"));  // the device alone is loaded
+    ASSERT_EQ(0, PreUnmount("a"));
+    m_fake.Unmount(MountPath("a"));
+    ChangeTask(task_id, [](TaskInfo& task) { task.hub_share_name = "music"; });
+    PlugIn("b", "u-1");
+    ASSERT_EQ(0, PostMount("b"));
+    EXPECT_EQ(MountPath("b"), LoadedDevices().front().usb_share_path);
+    EXPECT_EQ(MountPath("b"), Entry(task_id).src_dir_path);
+}
+
 // --- What keeps a task from being loaded; the device and its other tasks are loaded
 
 struct LoadFailure {
@@ -310,6 +324,21 @@ TEST_F(MountTest, ACandidateOfADisabledDefaultTaskIsNotLoaded) {
     EXPECT_FALSE(IsLoaded(task_id));
     std::string path;
     EXPECT_EQ(0, USBMatcher::GetInstance().GetMountPath(Task(task_id).usb_id, path));
+}
+
+TEST_F(MountTest, TheDefaultTaskIsLoadedForAMatchingDeviceAlone) {
+    const uint64_t task_id = AddDefaultTask(DEFAULT_USB_UUID);
+    PlugIn("a", "u-1", FRONT_USB);
+    EXPECT_EQ(-1, LoadDefaultTask("", "u-1"));
+    EXPECT_EQ(-1, LoadDefaultTask(MountPath("a"), ""));
+    EXPECT_EQ(2, m_log.Count("[ERR] Invalid parameter"));
+    EXPECT_EQ(0, LoadDefaultTask(MountPath("a"), "u-1"));  // no candidate
+    EXPECT_FALSE(IsLoaded(task_id));
+    EXPECT_TRUE(m_log.Has("[INFO] Current device 'u-1' is NOT a DEFAULT_TASK"));
+    ASSERT_EQ(0, USBMatcher::GetInstance().Register(MountPath("a"), DevicePath("a"), "u-1"));
+    EXPECT_EQ(0, LoadDefaultTask(MountPath("a"), "u-1"));
+    EXPECT_TRUE(IsLoaded(task_id));
+    EXPECT_TRUE(m_log.Has("[INFO] current uuid 'u-1' is a DEFAULT_TASK"));
 }
 
 // --- A device is unplugged

@@ -298,6 +298,20 @@ TEST_F(AddTaskTest, ATaskThatCannotBeBuiltIsAddedAndNotLoaded) {
         "[WARN] Failed to add task entry '1', usb_share_path = " + MountPath("a") + ", ignore"));
 }
 
+TEST_F(AddTaskTest, AnEmptyMountPathLeavesTheTaskUnloaded) {
+    EXPECT_THAT(Add([](PObject& request) { request["usb_share_path"] = ""; }), IsSuccess());
+    EXPECT_FALSE(IsLoaded(1));
+    EXPECT_TRUE(TaskEntryHandler::GetInstance().IsUSBEntryEmpty());
+    EXPECT_TRUE(m_log.Has("[ERR] Failed to prepare usb entry for usb_share_path '', usb id '1'"));
+    EXPECT_TRUE(m_log.Has("[WARN] Failed to add usb entry '1', usb_share_path = , ignore"));
+}
+
+TEST_F(AddTaskTest, AnEmptyUuidHasNoDefaultTaskToRelease) {
+    EXPECT_THAT(Add([](PObject& request) { request["uuid"] = ""; }), IsSuccess());
+    EXPECT_TRUE(m_log.Has("[ERR] Invalid parameter"));
+    EXPECT_EQ(0, m_log.Count("[INFO] Ferrixd: PauseProcessors"));
+}
+
 TEST_F(AddTaskTest, ValuesOfWrongKindsAreRefusedOrReadAsEmpty) {
     const auto with = [](const char* key, const PObject& value) {
         return [key, value](PObject& request) { request[key] = value; };

@@ -30,6 +30,9 @@ public:
     }
     static int Open(Ferrixd& app) { return app.InitEnvironment() < 0 ? -1 : app.InitProcessors(); }
     static void Start(Ferrixd& app) { app.StartAll(); }
+    static int LoadDefault(Ferrixd& app, const std::string& path, const std::string& uuid) {
+        return app.LoadDefaultTaskEntry(path, uuid);
+    }
     static int Load(Ferrixd& app) { return app.LoadUSBTaskEntries(); }
     static void Forget(Ferrixd& app) { app.DropAllEntries(); }
     static void Close(Ferrixd& app) { app.StopProcessors(); }
@@ -116,6 +119,10 @@ int CommandTest::PreUnmount(const std::string& name) {
 }
 
 int CommandTest::LoadEntries() { return FerrixdPeer::Load(m_app); }
+
+int CommandTest::LoadDefaultTask(const std::string& path, const std::string& uuid) {
+    return FerrixdPeer::LoadDefault(m_app, path, uuid);
+}
 
 void CommandTest::ForgetEntries() { FerrixdPeer::Forget(m_app); }
 

@@ -44,6 +44,8 @@ protected:
     // Loads what is mounted, as "link" does; and forgets all entries, as "stop" does.
     int LoadEntries();
     void ForgetEntries();
+    // Loads the default task for a device, as a removal of its own task does.
+    int LoadDefaultTask(const std::string& path, const std::string& uuid);
     // Writes the rows and the files of a default task, as the installer does.
     uint64_t AddDefaultTask(const char* uuid, bool is_enable = true);
 

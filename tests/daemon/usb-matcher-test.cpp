@@ -90,7 +90,7 @@ TEST_F(USBMatcherTest, OnlyOneOrTwoPartitionsQualify) {
         {3,  2}
     };
     for (const auto& [partitions, expected] : cases) {
-        const std::string name = "p" + std::to_string(partitions + 1);
+        const std::string name(1, static_cast<char>('b' + partitions));
         PlugIn(name, name, FRONT_USB, partitions);
         EXPECT_EQ(expected, Register(name, name)) << partitions << " partitions";
     }

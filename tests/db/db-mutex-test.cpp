@@ -3,6 +3,8 @@
 #include <gtest/gtest.h>
 
 #include <cerrno>
+#include <cstring>
+#include <new>
 
 #include "db/task-db.h"
 #include "support/log-capture.h"
@@ -63,6 +65,17 @@ TEST(DbMutexTest, FailedInitIsLogged) {
     t_failing = INIT;
     const DbMutex mutex;
     EXPECT_TRUE(log.Has("[ERR] cannot init mutex"));
+}
+
+TEST(DbMutexTest, LockWorksAlthoughItsInitHasFailed) {
+    alignas(DbMutex) unsigned char memory[sizeof(DbMutex)];
+    memset(memory, 0xff, sizeof(memory));  // no mutex reads like this
+    const LogCapture log;
+    t_failing = INIT;
+    auto* const mutex = new (memory) DbMutex;
+    { const DbLock lock(*mutex); }
+    mutex->~DbMutex();
+    EXPECT_EQ(std::vector<std::string>{"[ERR] cannot init mutex"}, log.Lines());
 }
 
 TEST(DbMutexTest, FailedDestroyIsLogged) {

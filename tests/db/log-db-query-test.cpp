@@ -62,7 +62,7 @@ TEST_F(LogDBTest, DescriptionsSelectTheirRowsAndNoneSelectsNothing) {
     EXPECT_EQ((Times{3, 1}), TimesOf(filter));
 }
 
-TEST_F(LogDBTest, KeywordMatchesPercentUnderscoreAndBackslashLiterally) {
+TEST_F(LogDBTest, KeywordMatchesPercentAndUnderscoreLiterally) {
     using enum LogDescription::ID;
     Add(Row(1, 1, LOG_DESC_TASK_ADDED, "100% done"));
     Add(Row(1, 2, LOG_DESC_TASK_ADDED, "100x done"));
@@ -77,6 +77,25 @@ TEST_F(LogDBTest, KeywordMatchesPercentUnderscoreAndBackslashLiterally) {
     EXPECT_EQ((Times{2, 1}), TimesOf(filter));
     filter.keyword = "nowhere";
     EXPECT_EQ((Times{}), TimesOf(filter));
+}
+
+TEST_F(LogDBTest, BackslashInTheKeywordTakesTheNextCharacterLiterally) {
+    using enum LogDescription::ID;
+    Add(Row(1, 1, LOG_DESC_TASK_ADDED, "a\\b"));  // stored as JSON, with two backslashes
+    Add(Row(1, 2, LOG_DESC_TASK_ADDED, "ab"));
+    LogFilter filter = Everything();
+    filter.keyword = "a\\b";
+    EXPECT_EQ((Times{2}), TimesOf(filter));
+    filter.keyword = "a\\\\\\\\b";
+    EXPECT_EQ((Times{1}), TimesOf(filter));
+}
+
+TEST_F(LogDBTest, KeywordMatchesAsciiLettersInEitherCase) {
+    using enum LogDescription::ID;
+    Add(Row(1, 1, LOG_DESC_TASK_ADDED, "Holiday"));
+    LogFilter filter = Everything();
+    filter.keyword = "hOLI";
+    EXPECT_EQ((Times{1}), TimesOf(filter));
 }
 
 TEST_F(LogDBTest, QuoteInTheKeywordReachesTheStatementUnchanged) {

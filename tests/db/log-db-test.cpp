@@ -20,13 +20,27 @@ TEST_F(LogDBTest, SchemaStandsAsDocumented) {
         Raw("SELECT name || ' ' || type || ' ' || \"notnull\" FROM "
             "pragma_table_info('log_info_table')"));
     EXPECT_EQ(
-        "log_info_table_description_id_idx|log_info_table_description_param_idx|"
-        "log_info_table_log_type_idx|log_info_table_task_id_idx|"
-        "log_info_table_timestamp_idx",
-        Raw("SELECT name FROM sqlite_master WHERE type = 'index' AND sql IS NOT NULL ORDER BY "
+        "CREATE INDEX log_info_table_description_id_idx on log_info_table(description_id)|"
+        "CREATE INDEX log_info_table_description_param_idx on log_info_table(description_param)|"
+        "CREATE INDEX log_info_table_log_type_idx on log_info_table(log_type)|"
+        "CREATE INDEX log_info_table_task_id_idx on log_info_table(task_id)|"
+        "CREATE INDEX log_info_table_timestamp_idx on log_info_table(timestamp)",
+        Raw("SELECT sql FROM sqlite_master WHERE type = 'index' AND sql IS NOT NULL ORDER BY "
             "name"));
     EXPECT_EQ("add_log_info_rotate_trigger|log_rotate_trigger",
               Raw("SELECT name FROM sqlite_master WHERE type = 'trigger' ORDER BY name"));
+}
+
+// What is settled for a connection alone leaves no trace in the file.
+TEST_F(LogDBTest, OpeningSettlesTheConnectionAndMakesTheSchemaInOneTransaction) {
+    LogDB db;
+    const StatementTrace trace;
+    ASSERT_EQ(0, db.Init(m_dir / "fresh.sqlite"));
+    EXPECT_EQ((std::vector<std::string>{
+                  "PRAGMA journal_mode = WAL;", "PRAGMA synchronous = NORMAL;",
+                  "PRAGMA recursive_triggers = true;", "BEGIN IMMEDIATE;", "COMMIT;"}),
+              trace.Framing());
+    db.Close();
 }
 
 TEST_F(LogDBTest, InitSaysWhereTheFileIs) {

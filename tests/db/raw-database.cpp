@@ -6,6 +6,44 @@
 #include <chrono>
 #include <thread>
 
+namespace {
+
+std::vector<std::string>& Traced() {
+    static std::vector<std::string> statements;
+    return statements;
+}
+
+int Collect(unsigned /*event*/, void* /*context*/, void* /*statement*/, void* sql) {
+    Traced().emplace_back(static_cast<const char*>(sql));
+    return 0;
+}
+
+int TraceNewConnection(sqlite3* db, char** /*message*/, const void* /*api*/) {
+    return sqlite3_trace_v2(db, SQLITE_TRACE_STMT, Collect, nullptr);
+}
+
+// The type that sqlite declares for every entry point.
+void (*TracePoint())() { return reinterpret_cast<void (*)()>(TraceNewConnection); }
+
+}  // namespace
+
+StatementTrace::StatementTrace() {
+    Traced().clear();
+    EXPECT_EQ(SQLITE_OK, sqlite3_auto_extension(TracePoint()));
+}
+
+StatementTrace::~StatementTrace() { EXPECT_EQ(1, sqlite3_cancel_auto_extension(TracePoint())); }
+
+std::vector<std::string> StatementTrace::Framing() const {
+    std::vector<std::string> framing;
+    for (const std::string& statement : Traced()) {
+        for (const char* word : {"PRAGMA", "BEGIN", "COMMIT", "ROLLBACK"}) {
+            if (statement.starts_with(word)) framing.push_back(statement);
+        }
+    }
+    return framing;
+}
+
 RawDatabase::RawDatabase(const std::string& path) {
     EXPECT_EQ(SQLITE_OK, sqlite3_open(path.c_str(), &m_db)) << path;
 }

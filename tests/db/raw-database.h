@@ -3,6 +3,7 @@
 #pragma once
 
 #include <string>
+#include <vector>
 
 struct sqlite3;
 
@@ -19,6 +20,19 @@ public:
 
 private:
     sqlite3* m_db = nullptr;
+};
+
+// Collects the statements, as they were written, of the connections that are opened while it lives;
+// one at a time, and only while one thread opens and uses them.
+class StatementTrace {
+public:
+    StatementTrace();
+    ~StatementTrace();
+    StatementTrace(const StatementTrace&) = delete;
+    StatementTrace& operator=(const StatementTrace&) = delete;
+
+    // Those that settle a connection or bound a transaction: PRAGMA, BEGIN, COMMIT, ROLLBACK.
+    [[nodiscard]] std::vector<std::string> Framing() const;
 };
 
 // Makes sqlite run out of memory for as long as it lives.

@@ -32,9 +32,10 @@ TEST_F(TaskDBTest, SchemaStandsAsDocumented) {
         Raw("SELECT cid || ' ' || name || ' ' || type || ' ' || \"notnull\" || ' ' || "
             "ifnull(dflt_value, '-') FROM pragma_table_info('task_info_table')"));
     EXPECT_EQ(
-        "task_info_table_hub_share_name_idx|task_info_table_usb_id_idx|"
-        "usb_info_table_uuid_idx",
-        Raw("SELECT name FROM sqlite_master WHERE type = 'index' AND sql IS NOT NULL ORDER BY "
+        "CREATE INDEX task_info_table_hub_share_name_idx on task_info_table(hub_share_name)|"
+        "CREATE INDEX task_info_table_usb_id_idx on task_info_table(usb_id)|"
+        "CREATE INDEX usb_info_table_uuid_idx on usb_info_table(uuid)",
+        Raw("SELECT sql FROM sqlite_master WHERE type = 'index' AND sql IS NOT NULL ORDER BY "
             "name"));
     EXPECT_EQ(
         "CREATE TRIGGER usb_info_delete_trigger AFTER DELETE ON usb_info_table BEGIN       "
@@ -45,6 +46,18 @@ TEST_F(TaskDBTest, SchemaStandsAsDocumented) {
         Raw("SELECT sql FROM sqlite_master WHERE type = 'trigger'"));
     EXPECT_EQ("task_info_table|usb_info_table",
               Raw("SELECT name FROM sqlite_master WHERE sql LIKE '%AUTOINCREMENT%' ORDER BY name"));
+}
+
+// What is settled for a connection alone leaves no trace in the file.
+TEST_F(TaskDBTest, OpeningSettlesTheConnectionAndMakesTheSchemaInOneTransaction) {
+    TaskDB db;
+    const StatementTrace trace;
+    ASSERT_EQ(0, db.Init(m_dir / "fresh.sqlite"));
+    EXPECT_EQ((std::vector<std::string>{
+                  "PRAGMA journal_mode = WAL;", "PRAGMA synchronous = NORMAL;",
+                  "PRAGMA recursive_triggers = true;", "BEGIN IMMEDIATE;", "COMMIT;"}),
+              trace.Framing());
+    db.Close();
 }
 
 TEST_F(TaskDBTest, InitTwiceKeepsTheFirstConnection) {

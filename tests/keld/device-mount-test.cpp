@@ -1,88 +1,12 @@
 // Plugged-in devices as the kernel has them: images on loop devices, really mounted.
-#include <fcntl.h>
-#include <keld/device.h>
-#include <keld/error.h>
-#include <keld/fs.h>
 #include <keld/keyfile.h>
-#include <keld/share.h>
-#include <keld/volume.h>
-#include <sched.h>
-#include <signal.h>
-#include <sys/mount.h>
 #include <sys/stat.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
-#include <fstream>
-#include <map>
-
-#include "host-fixture.h"
-#include "loop-disk.h"
-#include "utils/unique-fd.h"
-
-namespace {
-
-using Volumes = std::map<std::string, std::string>;  // mount path, device path
-
-class DeviceMount : public HostFixture {
-protected:
-    void SetUp() override {
-        const std::string reason = WhyNoLoop();
-        if (!reason.empty()) GTEST_SKIP() << reason;
-        EnterMountNamespace();
-        keld_host::SetPaths(keld_host::Paths());  // looks at the new namespace from now on
-    }
-
-    static Volumes Plugged() {
-        Volumes found;
-        KELDMountVolInfo* list = KELDMountVolAllEnum(0, 4);
-        EXPECT_EQ(KELDERR_SUCCESS, KLIBCErrGet());
-        for (const KELDMountVolInfo* node = list; node != nullptr; node = node->next) {
-            EXPECT_EQ(1, node->is_mounted);
-            EXPECT_EQ(0, node->is_internal);
-            found[node->mount_path] = node->device_path;
-        }
-        KELDMountVolInfoFree(list);
-        return found;
-    }
-    static std::string ShareOf(const std::string& path) {
-        char name[4095];
-        char root[4095];
-        return KELDShareNamePathGet(path.c_str(), name, sizeof(name), root, sizeof(root)) == 0
-                   ? std::string(name) + " " + root
-                   : "(none)";
-    }
-    static std::string Identity(const std::string& path) {
-        char identity[KELD_DEV_IDENTITY_SIZE];
-        EXPECT_EQ(0, KELDDevIdentityGet(path.c_str(), identity, sizeof(identity)));
-        return identity;
-    }
-    static bool IsMounted(const std::string& path) {
-        return KELDFSHasMountPoint(path.c_str()) == 1;
-    }
-    static void Unmount(const std::string& path) { ASSERT_EQ(0, umount2(path.c_str(), 0)) << path; }
-    void PlugIn(const LoopDisk& disk) const {
-        Conf("[removable]\ndevices = " + disk.Node() + "\n");
-    }
-    static void Put(const std::string& path, const std::string& text) {
-        std::ofstream(path) << text;
-    }
-};
-
-// The same for each kind of file system.
-class DeviceOfKind : public DeviceMount, public ::testing::WithParamInterface<const char*> {
-protected:
-    void SetUp() override {
-        const std::string reason = WhyNoLoop(GetParam());
-        if (!reason.empty()) GTEST_SKIP() << reason;
-        DeviceMount::SetUp();
-    }
-};
+#include "device-fixture.h"
 
 INSTANTIATE_TEST_SUITE_P(Kinds, DeviceOfKind, ::testing::Values("ext4", "xfs", "btrfs", "exfat"),
                          [](const auto& test) { return std::string(test.param); });
-
-}  // namespace
 
 TEST_P(DeviceOfKind, IsAVolumeAndAShareForAsLongAsItIsMounted) {
     LoopDisk disk(GetParam(), 0);
@@ -139,34 +63,6 @@ TEST_P(DeviceOfKind, AnotherDiskOnTheSamePathAndNumberIsNotTheOldOne) {
     disk.Mount(path);
     EXPECT_EQ(0, KELDDevIsPresent(path.c_str(), identity.c_str()));
     EXPECT_EQ(1, KELDDevIsPresent(path.c_str(), Identity(path).c_str()));
-}
-
-TEST_P(DeviceOfKind, IsEjectedWithAllThatWasWritten) {
-    LoopDisk disk(GetParam(), 0);
-    PlugIn(disk);
-    const std::string path = disk.Mount(m_dir / "mnt");
-    const std::string text(300000, 'x');
-    Put(path + "/file", text);
-    EXPECT_EQ(0, KELDExtStgPullOut(disk.Name().c_str(), 4));
-    EXPECT_FALSE(IsMounted(path));
-    EXPECT_NE(0, access((path + "/file").c_str(), F_OK));
-    disk.Mount(path, 0, "ro");
-    EXPECT_TRUE(ReadWholeFile(path + "/file") == text);
-}
-
-TEST_P(DeviceOfKind, IsNotEjectedWhileItIsBusy) {
-    LoopDisk disk(GetParam(), 0);
-    PlugIn(disk);
-    const std::string path = disk.Mount(m_dir / "mnt");
-    Put(path + "/file", "text");
-    UniqueFd fd(open((path + "/file").c_str(), O_RDONLY | O_CLOEXEC));
-    ASSERT_TRUE(fd.IsValid());
-    EXPECT_GT(0, KELDExtStgPullOut(disk.Name().c_str(), 4));
-    EXPECT_TRUE(IsMounted(path));
-    EXPECT_EQ("text", ReadWholeFile(path + "/file"));
-    fd.Reset();
-    EXPECT_EQ(0, KELDExtStgPullOut(disk.Name().c_str(), 4));
-    EXPECT_FALSE(IsMounted(path));
 }
 
 TEST_P(DeviceOfKind, HoldsAKeyFile) {
@@ -281,49 +177,6 @@ TEST_F(DeviceMount, ALoopDeviceWithoutAnImageHasNoPartitions) {
     EXPECT_GT(0, DiskPartitionsLayoutGet(name.c_str(), nullptr, 0));
 }
 
-TEST_F(DeviceMount, EjectUnmountsEveryFileSystemOfTheDisk) {
-    LoopDisk disk("ext4", 2);
-    PlugIn(disk);
-    const std::string first = disk.Mount(m_dir / "one", 1);
-    const std::string second = disk.Mount(m_dir / "one/two", 2);
-    const std::string again = disk.Mount(m_dir / "again", 1);
-    ASSERT_EQ(0, mkdir((first + "/sub").c_str(), 0700));
-    const std::string bound = m_dir.MakeDir("bound");
-    ASSERT_EQ(0, mount((first + "/sub").c_str(), bound.c_str(), nullptr, MS_BIND, nullptr));
-    EXPECT_EQ(0, KELDExtStgPullOut(disk.Name().c_str(), 4));
-    for (const std::string& path : {first, second, again, bound})
-        EXPECT_FALSE(IsMounted(path)) << path;
-}
-
-TEST_F(DeviceMount, EjectOfADiskWithoutMountsSucceeds) {
-    const LoopDisk disk("ext4", 1);
-    PlugIn(disk);
-    EXPECT_EQ(0, KELDExtStgPullOut(disk.Name().c_str(), 4));
-}
-
-TEST_F(DeviceMount, ADiskThatAnotherNamespaceHasMountedIsBusy) {
-    LoopDisk disk("ext4", 0);
-    PlugIn(disk);
-    disk.Mount(m_dir / "mnt");
-    int ready[2];
-    ASSERT_EQ(0, pipe2(ready, O_CLOEXEC));
-    const pid_t child = fork();
-    if (child == 0) {
-        const bool isAway = unshare(CLONE_NEWNS) == 0;
-        static_cast<void>(!write(ready[1], isAway ? "y" : "n", 1));
-        for (;;) pause();
-    }
-    char answer = 'n';
-    EXPECT_EQ(1, read(ready[0], &answer, 1));
-    EXPECT_EQ('y', answer);
-    EXPECT_GT(0, KELDExtStgPullOut(disk.Name().c_str(), 4));
-    kill(child, SIGKILL);
-    waitpid(child, nullptr, 0);
-    EXPECT_EQ(0, KELDExtStgPullOut(disk.Name().c_str(), 4));
-    close(ready[0]);
-    close(ready[1]);
-}
-
 TEST_F(DeviceMount, OfTwoDevicesOfOneNameTheLaterOneGetsANumber) {
     LoopDisk disk("ext4", 2);
     const std::string first = disk.Mount(m_dir / "b/STICK", 2);
@@ -362,8 +215,7 @@ TEST_F(DeviceMount, AFolderOfADeviceBoundElsewhereIsNoDeviceOfItsOwn) {
     PlugIn(disk);
     const std::string path = disk.Mount(m_dir / "mnt");
     ASSERT_EQ(0, mkdir((path + "/sub").c_str(), 0700));
-    const std::string bound = m_dir.MakeDir("bound");
-    ASSERT_EQ(0, mount((path + "/sub").c_str(), bound.c_str(), nullptr, MS_BIND, nullptr));
+    const std::string bound = disk.Bind(path + "/sub", m_dir / "bound");
     EXPECT_EQ((Volumes{
                   {path, disk.Node()}
     }),

@@ -93,6 +93,13 @@ std::string LoopDisk::Mount(const std::string& folder, int partition, const std:
     return folder;
 }
 
+std::string LoopDisk::Bind(const std::string& from, const std::string& to) {
+    EXPECT_TRUE(Shell("mkdir -p '" + to + "'"));
+    EXPECT_EQ(0, mount(from.c_str(), to.c_str(), nullptr, MS_BIND, nullptr)) << to;
+    m_mounted.push_back(to);
+    return to;
+}
+
 void LoopDisk::Exchange(LoopDisk& other) {
     const std::string name = m_name;
     Detach();

@@ -33,6 +33,8 @@ public:
     // Mounts a file system on a folder, which is made; returns the folder.
     std::string Mount(const std::string& folder, int partition = 0,
                       const std::string& options = "rw");
+    // Binds a folder of the disk to another place, which is made; returns that place.
+    std::string Bind(const std::string& from, const std::string& to);
     // Takes the image out of its device and puts the other's image there, as a stick that is pulled
     // and followed by another. Both must be unmounted.
     void Exchange(LoopDisk& other);

@@ -88,6 +88,21 @@ TEST_F(Shares, ANewFolderIsAShareAtOnceAndARemovedOneIsNoneAtOnce) {
     EXPECT_EQ((Texts{"a", "c"}), Names());
 }
 
+TEST_F(Shares, APathIsInAShareAsLongAsTheSharesFolderIsThere) {
+    const std::string folder = m_dir.MakeDir("volume1/a");
+    m_dir.MakeDir("volume1/b");
+    EXPECT_EQ("b " + (m_dir / "volume1/b"), Holding(m_dir / "volume1/b/x"));
+    for (int i = 0; i < 20; ++i) {
+        EXPECT_EQ("a " + folder, Holding(folder + "/x"));
+        ASSERT_EQ(0, rmdir(folder.c_str()));
+        EXPECT_EQ("(none)", Holding(folder + "/x"));
+        ASSERT_EQ(0, symlink("b", folder.c_str()));
+        EXPECT_EQ("(none)", Holding(folder + "/x"));
+        ASSERT_EQ(0, unlink(folder.c_str()));
+        m_dir.MakeDir("volume1/a");
+    }
+}
+
 TEST_F(Shares, OfTwoFoldersOfOneNameTheOneOnTheLowerVolumeIsTheShare) {
     m_dir.MakeDir("volume9/photos");
     m_dir.MakeDir("volume10/photos");

@@ -62,8 +62,8 @@ TEST_F(FileListTest, FilesAndFoldersAreMerged) {
     ASSERT_EQ(0, m_list.AddFile(b, "z", 0, 0));
     ASSERT_EQ(0, m_list.AddFile(d, "1", 0, 0));
     EXPECT_EQ(5, m_list.AddDir(m_list.AddDir(d, "0", 0), "deep", 0) + 1);
-    EXPECT_THAT(Paths(m_list), ElementsAre("/e", "/d/1", "/d/0/deep/", "/d/0/", "/d/", "/c", "/b/z",
-                                           "/b/", "/a"));
+    EXPECT_THAT(Paths(m_list),
+                ElementsAre("/e", "/d/1", "/d/0/deep/", "/d/0/", "/d/", "/c", "/b/z", "/b/", "/a"));
 }
 
 TEST_F(FileListTest, EmptyFoldersAloneComeInDescendingOrder) {
@@ -73,12 +73,12 @@ TEST_F(FileListTest, EmptyFoldersAloneComeInDescendingOrder) {
 
 TEST_F(FileListTest, NamesAreOrderedByTheirBytes) {
     // A prefix comes before its extensions, and bytes above 127 are the greatest.
-    for (const char* name : {"a", "ab", "a.b", "A", "\xff", "\xc3\xa4", "b\n", "b", "aaaaaaaaab",
-                             "aaaaaaaaaa"}) {
+    for (const char* name :
+         {"a", "ab", "a.b", "A", "\xff", "\xc3\xa4", "b\n", "b", "aaaaaaaaab", "aaaaaaaaaa"}) {
         ASSERT_EQ(0, m_list.AddFile(0, name, 0, 0));
     }
-    EXPECT_THAT(Paths(m_list), ElementsAre("/\xff", "/\xc3\xa4", "/b\n", "/b", "/ab",
-                                           "/aaaaaaaaab", "/aaaaaaaaaa", "/a.b", "/a", "/A"));
+    EXPECT_THAT(Paths(m_list), ElementsAre("/\xff", "/\xc3\xa4", "/b\n", "/b", "/ab", "/aaaaaaaaab",
+                                           "/aaaaaaaaaa", "/a.b", "/a", "/A"));
 }
 
 TEST_F(FileListTest, ANameAddedTwiceLeavesTheFirstUnchanged) {
@@ -151,7 +151,10 @@ TEST_F(FileListTest, AFolderAddedByPathTakesTheNewTime) {
     std::map<std::string, uint32_t> times;
     for (auto it = m_list.begin(); it != m_list.end(); ++it) times[it->path] = (*it).mtime;
     EXPECT_EQ((std::map<std::string, uint32_t>{
-                  {"/a", 0}, {"/a/b", 9}, {"/a/b/c", 5}, {"/a/x", 3}
+                  {"/a",     0},
+                  {"/a/b",   9},
+                  {"/a/b/c", 5},
+                  {"/a/x",   3}
     }),
               times);
 }

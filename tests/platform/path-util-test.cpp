@@ -20,21 +20,21 @@ struct Case {
 };
 
 const Case kCases[] = {
-    {"/a/b.txt",       "/a",    "b.txt",      "txt", "/a/b"         },
-    {"/a",             "/",     "a",          "",    "/a"           },
-    {"/",              "/",     "",           "",    "/"            },
-    {"",               ".",     "",           "",    ""             },
-    {"a",              ".",     "a",          "",    "a"            },
-    {"a/b",            "a",     "b",          "",    "a/b"          },
-    {"a/",             "a",     "",           "",    "a/"           },
-    {"//a",            "/",     "a",          "",    "//a"          },
-    {"/a/.profile",    "/a",    ".profile",   "",    "/a/.profile"  },
-    {"/a/.profile.gz", "/a",    ".profile.gz", "gz", "/a/.profile"  },
-    {"/a/x.tar.gz",    "/a",    "x.tar.gz",   "gz",  "/a/x.tar"     },
-    {"/a.d/b",         "/a.d",  "b",          "",    "/a.d/b"       },
-    {"/a/b.",          "/a",    "b.",         "",    "/a/b."        },
-    {"/a/..",          "/a",    "..",         "",    "/a/.."        },
-    {"/a/b\n.\xff",    "/a",    "b\n.\xff",   "\xff", "/a/b\n"      },
+    {"/a/b.txt",       "/a",   "b.txt",       "txt",  "/a/b"       },
+    {"/a",             "/",    "a",           "",     "/a"         },
+    {"/",              "/",    "",            "",     "/"          },
+    {"",               ".",    "",            "",     ""           },
+    {"a",              ".",    "a",           "",     "a"          },
+    {"a/b",            "a",    "b",           "",     "a/b"        },
+    {"a/",             "a",    "",            "",     "a/"         },
+    {"//a",            "/",    "a",           "",     "//a"        },
+    {"/a/.profile",    "/a",   ".profile",    "",     "/a/.profile"},
+    {"/a/.profile.gz", "/a",   ".profile.gz", "gz",   "/a/.profile"},
+    {"/a/x.tar.gz",    "/a",   "x.tar.gz",    "gz",   "/a/x.tar"   },
+    {"/a.d/b",         "/a.d", "b",           "",     "/a.d/b"     },
+    {"/a/b.",          "/a",   "b.",          "",     "/a/b."      },
+    {"/a/..",          "/a",   "..",          "",     "/a/.."      },
+    {"/a/b\n.\xff",    "/a",   "b\n.\xff",    "\xff", "/a/b\n"     },
 };
 
 TEST(PathUtil, PathsAreTakenApart) {

@@ -57,8 +57,8 @@ TEST_F(PerDeviceValueTest, AMissingFileKeyOrAnEmptyValueIsNoValue) {
 }
 
 TEST_F(PerDeviceValueTest, AValueMayHave63Bytes) {
-    m_dir.Write("@eaDir/.KeldoranFerrix.config", "fits=\"" + std::string(63, 'x') + "\"\nlong=\"" +
-                                                     std::string(64, 'x') + "\"\n");
+    m_dir.Write("@eaDir/.KeldoranFerrix.config",
+                "fits=\"" + std::string(63, 'x') + "\"\nlong=\"" + std::string(64, 'x') + "\"\n");
     EXPECT_TRUE(GetPerDeviceValue(m_dir.Path(), "fits", m_value));
     EXPECT_EQ(63u, m_value.size());
     EXPECT_FALSE(GetPerDeviceValue(m_dir.Path(), "long", m_value));

@@ -223,6 +223,17 @@ TEST_F(ScheduleTest, ScheduleOfMinusOneIsPassedToTheScheduler) {
     ExpectNothingIsHeld();
 }
 
+TEST_F(ScheduleTest, IdThatNoEntryCanHaveIsNotTakenForAnother) {
+    const int64_t id = Create();
+    const int64_t beyond = (int64_t{1} << 32) + id;
+    const LogCapture log;
+    EXPECT_FALSE(UpdateScheduleName(beyond, "other"));
+    EXPECT_FALSE(UpdateSchedule(beyond, false, "{}"));
+    EXPECT_EQ(2, log.Count("[ERR] KELDSchedTaskLoad() failed."));
+    EXPECT_EQ("my task", Entry(id).name);
+    EXPECT_EQ(1, Entry(id).state);
+}
+
 TEST_F(ScheduleTest, EveryFailureOfAnUpdateIsTold) {
     const int64_t id = Create();
     const std::pair<const char*, Lines> cases[] = {

@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include <atomic>
+#include <chrono>
 #include <cstdlib>
 #include <fstream>
 #include <thread>
@@ -29,21 +30,41 @@ protected:
 
 // --- The lock
 
+// Another thread that wants the lock.
+class OtherThread {
+public:
+    explicit OtherThread(SDK::ReentrantMutex& mutex)
+        : m_thread([this, &mutex] {
+              m_is_there = true;
+              const SDK::ReentrantLock lock(mutex);
+              m_has_entered = true;
+          }) {}
+    // Nothing shows from outside that it waits, so it is given time to come in where it could.
+    bool HasEntered() {
+        while (!m_is_there) std::this_thread::yield();
+        std::this_thread::sleep_for(std::chrono::milliseconds(50));
+        return m_has_entered;
+    }
+    bool EntersAtLast() {
+        m_thread.join();
+        return m_has_entered;
+    }
+
+private:
+    std::atomic<bool> m_is_there = false;
+    std::atomic<bool> m_has_entered = false;
+    std::thread m_thread;  // the last member: it uses the others
+};
+
 TEST_F(SdkWrapperTest, LockAndUnlockNestOnOneThread) {
     SDK::ReentrantMutex mutex;
     mutex.Lock();
     mutex.Lock();
     mutex.Unlock();
-    std::atomic<bool> entered = false;
-    std::thread other([&] {
-        const SDK::ReentrantLock lock(mutex);
-        entered = true;
-    });
-    // One of two locks is still held: the other thread cannot have come in.
-    EXPECT_FALSE(entered);
+    OtherThread other(mutex);
+    EXPECT_FALSE(other.HasEntered()) << "one of two locks is still held";
     mutex.Unlock();
-    other.join();
-    EXPECT_TRUE(entered);
+    EXPECT_TRUE(other.EntersAtLast());
 }
 
 TEST_F(SdkWrapperTest, UnlockByAThreadThatDoesNotHoldTheLockChangesNothing) {
@@ -51,15 +72,10 @@ TEST_F(SdkWrapperTest, UnlockByAThreadThatDoesNotHoldTheLockChangesNothing) {
     mutex.Unlock();
     mutex.Lock();
     std::thread([&] { mutex.Unlock(); }).join();
-    std::atomic<bool> entered = false;
-    std::thread other([&] {
-        const SDK::ReentrantLock lock(mutex);
-        entered = true;
-    });
-    EXPECT_FALSE(entered);
+    OtherThread other(mutex);
+    EXPECT_FALSE(other.HasEntered());
     mutex.Unlock();
-    other.join();
-    EXPECT_TRUE(entered);
+    EXPECT_TRUE(other.EntersAtLast());
 }
 
 TEST_F(SdkWrapperTest, OneThreadAtATimeIsInsideThePlatform) {
@@ -716,6 +732,20 @@ TEST_F(CreateRecycleBinTest, FailsStepByStepWithALineEach) {
     m_fake.FailCall("KELDACLSet");
     EXPECT_EQ(-1, SDK::CreateRecycleBin(m_bin + "3", false));
     EXPECT_TRUE(m_log.Has("[ERR] Failed to SetRecycleBinPermission"));
+}
+
+TEST_F(CreateRecycleBinTest, IsNotLedElsewhereByALinkThatTakesThePlaceOfTheFolder) {
+    const std::string elsewhere = m_dir.MakeDir("elsewhere");
+    ASSERT_EQ(0, chmod(elsewhere.c_str(), 0711));
+    const std::string moved = m_dir / "moved";
+    m_fake.OnCall("KELDACLIsSupport", [&] {
+        ASSERT_EQ(0, rename(m_bin.c_str(), moved.c_str()));
+        ASSERT_EQ(0, symlink(elsewhere.c_str(), m_bin.c_str()));
+    });
+    (void)SDK::CreateRecycleBin(m_bin, false);
+    EXPECT_EQ(0711u, ModeOf(elsewhere));
+    EXPECT_NE(0, access((elsewhere + "/desktop.ini").c_str(), F_OK));
+    EXPECT_EQ(0777u, ModeOf(moved));
 }
 
 TEST_F(CreateRecycleBinTest, FailsWhenTheIconFileCannotBeWritten) {

@@ -180,6 +180,31 @@ TEST_F(TaskHandlerTest, AnInterruptedRunKeepsItsOutcomeAndRenamesNothing) {
     EXPECT_FALSE(IsThere(Dst() + ".Bad"));
 }
 
+TEST_F(TaskHandlerTest, ABrokenOffRunLeavesOnlyItsLastMomentsUnproven) {
+    m_handler.m_work = [this] {
+        m_dir.Write("volume1/@Ferrix/task/7/unproven-run", "0 0 1\n");  // began long ago
+        PushPendingEvent();
+        m_abort = 1;
+    };
+    const time_t before = time(nullptr);
+    EXPECT_EQ(ERR_INTERRUPTED, Run());
+    long long open = 0;
+    ASSERT_EQ(1, sscanf(ReadWholeFile(RecordPath()).c_str(), "0 0 %lld", &open));
+    EXPECT_GE(open, before - 2) << "what came before is flushed";
+}
+
+TEST_F(TaskHandlerTest, ABrokenOffRunWithoutItsDestinationLeavesAllUnproven) {
+    MakeExport();
+    m_handler.m_work = [this] {
+        m_dir.Write("volume1/@Ferrix/task/7/unproven-run", "0 0 1\n");
+        PushPendingEvent();
+        m_fake.Pull(m_usb);
+        m_abort = 1;
+    };
+    EXPECT_EQ(ERR_INTERRUPTED, Run());
+    EXPECT_EQ("0 0 1\n", ReadWholeFile(RecordPath()));
+}
+
 TEST_F(TaskHandlerTest, AMirrorNeverRotates) {
     m_task.enable_rotation = true;
     m_task.max_version_count = 1;

@@ -87,6 +87,7 @@ def scenario(box, fs, stick_name):
     stick.hook("post_mount")
     wait_until(lambda: os.path.exists(f"{share}/roll0/new140.jpg"), 120, 0.02)
     print("YANK", flush=True)
+    wait_until(lambda: not sticks(), 60, what="the pull")
     wait_until(lambda: ended_runs(box) > runs, 240, what="the end of the broken run")
     nothing_is_gone(before, share)
 
@@ -94,7 +95,7 @@ def scenario(box, fs, stick_name):
     stick.hook("pre_unmount")
     subprocess.run(["umount", "-l", stick.mountpoint], check=True)
     print("PLUG", flush=True)
-    name = wait_until(lambda: [s for s in sticks() if s != name], 60, what="the stick")[-1]
+    name = wait_until(sticks, 60, what="the stick")[0]
     stick.loop = make_node(name)
     box.write_host_conf()
     time.sleep(1)

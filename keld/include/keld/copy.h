@@ -53,8 +53,8 @@ int KELDCopyTHRSetCallbackIsCancel(KELDCopyTHRArgs *args, KELDCopyIsCancel callb
  *
  * Returns 0; negative on failure, with these values of KLIBCErrGet:
  *   KELDERR_SRC_MISS_PATH       there is no source
- *   KELDERR_INVALID_ARGUMENT    the source is no regular file (a link, a folder, a FIFO), or a null or
- *                               empty path
+ *   KELDERR_INVALID_ARGUMENT    the source is no regular file (a link, a folder, a FIFO), a link stands
+ *                               on the way to it, or a path is null or empty
  *   KELDERR_DST_TYPE_CONFLICT   `to` exists and is no regular file; asked before the next
  *   KELDERR_DST_EXISTS          `to` exists and may not be replaced
  *   KELDERR_CANCELLED           the callback asked for it
@@ -64,8 +64,8 @@ int KELDCopyTHRSetCallbackIsCancel(KELDCopyTHRArgs *args, KELDCopyIsCancel callb
  *   KELDERR_NAME_NOT_SUPPORTED, KELDERR_NAME_TOO_LONG   it does not take the name
  *   KELDERR_IO                  also a device that is gone
  *   KELDERR_SYSTEM              no memory or no descriptors
- *   KELDERR_FILE_OPERATION      anything else: no folder to copy into, a symbolic link on the way, a
- *                               source that changed meanwhile */
+ *   KELDERR_FILE_OPERATION      anything else: no folder to copy into, a symbolic link on the way
+ *                               there, a source that changed meanwhile */
 int KELDFileCopy_r(const char *from, const char *to, const KELDCopyOptions *options,
                    KELDCopyTHRArgs *args);
 

@@ -3,6 +3,7 @@ import os
 import re
 import socket
 import threading
+import time
 
 LINE = re.compile(rb"<(\d+)>\w{3} [ \d]\d \d\d:\d\d:\d\d (\w+): (.*)", re.S)
 
@@ -33,6 +34,15 @@ class LogDaemon:
     def since(self, mark=0):
         with self._lock:
             return self.lines[mark:]
+
+    def expect(self, part, mark=0, timeout=20):
+        """True as soon as a line contains `part`; the line may be on its way still."""
+        deadline = time.monotonic() + timeout
+        while not self.has(part, mark):
+            if time.monotonic() > deadline:
+                return False
+            time.sleep(0.05)
+        return True
 
     def has(self, part, mark=0):
         return any(part in line for line in self.since(mark))

@@ -38,8 +38,8 @@ def enter(repository, scratch, extra=()):
     root = f"{scratch}/root"
     mount("overlay", root, "overlay", 0,
           f"lowerdir=/,upperdir={scratch}/upper,workdir={scratch}/work")
-    for path in ("/proc", "/sys"):
-        mount(path, root + path, None, MS_BIND | MS_REC)
+    mount("proc", root + "/proc", "proc")  # of this process namespace
+    mount("/sys", root + "/sys", None, MS_BIND | MS_REC)
     for path, mode in (("/tmp", "1777"), ("/run", "755"), ("/dev", "755")):
         mount("tmpfs", root + path, "tmpfs", 0, f"mode={mode},size=6g")
     for path in (repository, *extra):

@@ -25,7 +25,7 @@ def test_garbage_and_truncated_values(box):
     for cut in range(len(message)):
         assert wire.send_raw(message[:cut]) == b"", cut
     assert wire.send_raw(message) == ACK
-    assert box.log.has("Failed to recieve message from channel.")
+    assert box.log.expect("Failed to recieve message from channel.")
     alive()
 
 

@@ -17,8 +17,8 @@ def mode(path):
 def test_start_answer_and_stop(box):
     """The daemon starts, answers, writes its state, and ends on SIGTERM with nothing left behind."""
     box.start()
-    assert box.log.has("link daemon, version: 0037")
-    assert box.log.has("Link Daemon")
+    assert box.log.expect("link daemon, version: 0037")
+    assert box.log.expect("Link Daemon")
     with open(f"{PACKAGE}/etc/status", encoding="ascii") as status:
         assert 'state="4"' in status.read()
     assert mode("/run/ferrixd.pid") == 0o644
@@ -27,7 +27,7 @@ def test_start_answer_and_stop(box):
     assert not os.path.exists("/run/ferrixd.pid")
     assert not os.path.exists("/tmp/ferrix-socket")
     wait_until(lambda: box.log.has("Daemon End ..."), 10)
-    assert box.log.has("Unlink Daemon")
+    assert box.log.expect("Unlink Daemon")
 
 
 def test_unknown_names_are_acknowledged(box):
@@ -56,7 +56,7 @@ def test_second_start_leaves_the_first_alone(box):
     first = box.daemon_pid
     done = subprocess.run([f"{PACKAGE}/target/sbin/ferrixd"], check=False, timeout=30)
     assert done.returncode == 0
-    assert box.log.has(f"daemon is already running (pid = {first})")
+    assert box.log.expect(f"daemon is already running (pid = {first})")
     with open("/run/ferrixd.pid", encoding="ascii") as pid_file:
         assert int(pid_file.read()) == first
     assert box.ask("list_task")["task_list"] == []
@@ -121,8 +121,8 @@ def test_an_unusable_repository_ends_the_start(box):
     os.rename("/volume1/@Ferrix", "/volume1/away")
     box.start(wait=False)
     wait_until(lambda: box.log.has("Daemon End ..."), 60)
-    assert box.log.has("Failed to init task db at '/volume1/@Ferrix/db/task-db.sqlite'")
-    assert box.log.has("Failed to link daemon.")
+    assert box.log.expect("Failed to init task db at '/volume1/@Ferrix/db/task-db.sqlite'")
+    assert box.log.expect("Failed to link daemon.")
     assert not os.path.exists("/run/ferrixd.pid")
     os.rename("/volume1/away", "/volume1/@Ferrix")
     with open("/volume1/@Ferrix/db/task-db.sqlite", "wb") as bad:
@@ -130,7 +130,7 @@ def test_an_unusable_repository_ends_the_start(box):
     mark = box.log.mark()
     box.start(wait=False)
     wait_until(lambda: box.log.has("Daemon End ...", mark), 60)
-    assert box.log.has("Failed to create task db table at", mark)
+    assert box.log.expect("Failed to create task db table at", mark)
     with open("/volume1/@Ferrix/db/task-db.sqlite", "rb") as bad:
         assert bad.read(4) == b"this"
 

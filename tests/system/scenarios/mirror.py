@@ -201,7 +201,7 @@ def test_a_device_is_ejected_after_its_run(box):
     stick.hook("post_mount")
     wait_until(lambda: not os.path.ismount(stick.mountpoint), 60, what="the eject")
     stick.mounted = False
-    assert box.log.has("Eject USB for usb")
+    assert box.log.expect("Eject USB for usb")
     stick.hook("pre_unmount")
     assert box.status(task) == "unmounted"
     assert len(os.listdir(share)) > 0
@@ -234,7 +234,7 @@ def test_entries_are_loaded_for_devices_mounted_before_the_start(box):
     assert box.status(task) == "initial"
     assert os.listdir(share) == []
     wire.request({"action": "list_entry"})
-    assert box.log.has("usb_share_path")
+    assert box.log.expect("usb_share_path")
 
 
 def test_a_locked_share_is_not_written_to(box):
@@ -245,7 +245,7 @@ def test_a_locked_share_is_not_written_to(box):
     box.start()
     task = box.add_mirror(stick)
     stick.hook("post_mount")
-    assert box.log.has(f"Task '{task}' is not runnable")
+    assert box.log.expect(f"Task '{task}' is not runnable")
     assert box.task(task)["is_task_runnable"] == 0
     assert os.listdir(share) == []
 

@@ -300,5 +300,5 @@ def test_a_broken_host_configuration_keeps_the_last_good_state(box):
         conf.write("this is no setting\n")
     assert run(box, stick, task) == "successful"
     assert os.path.exists(share + "/a")
-    assert box.log.has("host.conf")
+    assert box.log.expect("host.conf")
     assert wire.request({"action": "list_task"})["task_list"][0]["is_hub_mounted"] == 1

@@ -1,5 +1,5 @@
-// Tasks are cancelled thousands of times at random moments, with the real worker threads at work.
-// A lost abort shows as a hang, which the time limit of the test program ends.
+// Aborts. Tasks are cancelled thousands of times at random moments, with the real worker threads at
+// work. A lost abort shows as a hang, which the time limit of the test program ends.
 
 #include <atomic>
 #include <random>
@@ -164,6 +164,84 @@ TEST_F(AbortStressTest, ACancelledTaskIsOutOfWorkAndNothingHangs) {
     EXPECT_EQ(0, m_task_worker.Join());
     EXPECT_EQ(0, m_file_worker.Join());
     EXPECT_EQ(0, HardwareController::GetInstance().Join());
+}
+
+// An abort that comes between the pull of work and the note of what it is: the log line of the pull
+// is where another thread gets its chance.
+class AbortDuringPullTest : public WorkerFixture {
+protected:
+    AbortDuringPullTest() {
+        s_test = this;
+        m_strategy->task_script = [this](ScriptedTaskHandler& handler) {
+            return AwaitFlag(handler.GetAbortFlag());
+        };
+        m_strategy->file_script = [this](const HandlerCall& call) {
+            return AwaitFlag(call.abort_flag);
+        };
+        m_task = AddTask("holiday");
+        Processor::SetWaitStepForTest(1000);
+    }
+    ~AbortDuringPullTest() override { LogSetSink(nullptr); }
+
+    // Runs the worker until it has pulled its work and been aborted meanwhile.
+    void RunAndAbort(WorkerProcessor& worker, const std::string& pull_line) {
+        m_worker = &worker;
+        m_pull_line = pull_line;
+        LogSetSink([](int, std::string_view line) { s_test->OnLine(line); });
+        ASSERT_EQ(0, worker.Start());
+        while (!m_is_aborted) sched_yield();
+        m_control.join();
+        EXPECT_EQ(0U, m_task_after_wait);
+        EXPECT_TRUE(m_was_told);
+        LogSetSink(nullptr);
+        worker.Stop();
+        EXPECT_EQ(0, worker.Join());
+    }
+
+    static AbortDuringPullTest* s_test;
+    uint64_t m_task = 0;
+
+private:
+    // The work goes on until it is told to end; an abort that was lost would leave it for ever.
+    int AwaitFlag(const std::atomic<int>* abort_flag) {
+        for (int i = 0; i < 20000 && abort_flag->load() == 0; ++i) usleep(1000);
+        m_was_told = abort_flag->load() != 0;
+        return ERR_INTERRUPTED;
+    }
+    void OnLine(std::string_view line) {
+        if (line.find(m_pull_line) == std::string_view::npos || m_control.joinable()) return;
+        m_control = std::thread([this] {
+            m_worker->Pause();
+            Barrier barrier;
+            m_worker->Abort(m_task, &barrier);
+            barrier.Wait();
+            m_task_after_wait = m_worker->GetCurrentTaskId();
+            m_is_aborted = true;
+        });
+        usleep(20000);  // a chance for it; it must not get through before the work is noted
+    }
+
+    std::atomic<bool> m_was_told{false};
+    WorkerProcessor* m_worker = nullptr;
+    std::string m_pull_line;
+    std::thread m_control;
+    std::atomic<uint64_t> m_task_after_wait{99};
+    std::atomic<bool> m_is_aborted{false};
+};
+
+AbortDuringPullTest* AbortDuringPullTest::s_test = nullptr;
+
+TEST_F(AbortDuringPullTest, TheTaskWorkerIsWaitedFor) {
+    TaskProcessor worker;
+    TaskEventManager::GetInstance().PushEvent(m_task);
+    RunAndAbort(worker, "TaskEventManager: PullEvent");
+}
+
+TEST_F(AbortDuringPullTest, TheFileWorkerIsWaitedFor) {
+    FileProcessor worker;
+    TaskEntryHandler::GetInstance().SetTaskState(m_task, TASK_RUN_STATE_RUNNING);
+    EventGenerator(m_task).PushScanEvent("/");
+    RunAndAbort(worker, "EventManager::PullEvent");
 }
 
 }  // namespace
