@@ -6,6 +6,7 @@
 
 #include <cerrno>
 
+#include "platform/sdk-mutex.h"
 #include "utils/confined-path.h"
 #include "utils/log.h"
 
@@ -29,6 +30,7 @@ bool SetPerDeviceValue(const std::string& device_root, const std::string& key,
                        const std::string& value) {
     if (device_root.empty() || key.empty() || value.empty()) return false;
     const std::string file = device_root + kKeyFile;
+    const SDK::ReentrantLock lock;
     if (!IsLinkInTheWay(device_root, file) &&
         KLIBCFileSetKeyValue(file.c_str(), key.c_str(), value.c_str(), KELD_KEY_VALUE_FORMAT) ==
             0) {
@@ -45,6 +47,7 @@ bool GetPerDeviceValue(const std::string& device_root, const std::string& key, s
     const std::string file = device_root + kKeyFile;
     char buffer[kValueRoom] = "";
     if (IsLinkInTheWay(device_root, file)) return false;
+    const SDK::ReentrantLock lock;
     if (KLIBCFileGetKeyValue(file.c_str(), key.c_str(), buffer, sizeof(buffer), 0) <= 0)
         return false;
     value = buffer;

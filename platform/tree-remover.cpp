@@ -7,6 +7,7 @@
 #include <cerrno>
 #include <cstring>
 
+#include "platform/sdk-mutex.h"
 #include "utils/log.h"
 
 namespace {
@@ -38,6 +39,7 @@ TreeRemover::TreeRemover(int parent_fd, std::string name, std::string path)
       m_buffer(kBufferBytes) {}
 
 bool TreeRemover::RemoveAttributes(const std::string& path) {
+    const SDK::ReentrantLock lock;
     errno = 0;
     if (KELDEARemove(path.c_str(), -1, 0) == 0) return true;
     SLOG_ERR("Failed to remove ea '%s', [%d, %s]\n", path.c_str(), errno, std::strerror(errno));

@@ -70,14 +70,14 @@ UnprovenRun::UnprovenRun(uint64_t task_id) : m_folder(TaskFolder(task_id)) {
 }
 
 int UnprovenRun::Begin() {
-    const int64_t now = time(nullptr) - SLACK_SECONDS;
+    const int64_t now = time(nullptr);
+    const int64_t start = now - SLACK_SECONDS;
     if (m_open != 0) {
         // The last run came to no good end. A clock that was set back says nothing about the end.
-        const bool is_clock_back = now < m_open;
-        m_until = is_clock_back ? FOREVER : std::max(m_until, now);
-        m_from = std::min(m_from == 0 ? m_open : std::min(m_from, m_open), now);
+        m_until = start < m_open ? FOREVER : std::max(m_until, now + SLACK_SECONDS);
+        m_from = std::min(m_from == 0 ? m_open : std::min(m_from, m_open), start);
     }
-    m_open = now;
+    m_open = start;
     return Write();
 }
 

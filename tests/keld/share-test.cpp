@@ -5,6 +5,10 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <atomic>
+#include <cstdio>
+#include <thread>
+
 #include "host-fixture.h"
 #include "host/share-table.h"
 #include "support/log-capture.h"
@@ -101,6 +105,32 @@ TEST_F(Shares, APathIsInAShareAsLongAsTheSharesFolderIsThere) {
         ASSERT_EQ(0, unlink(folder.c_str()));
         m_dir.MakeDir("volume1/a");
     }
+}
+
+TEST_F(Shares, ManyThreadsMayAskWhileTheConfigurationChanges) {
+    Conf("[share a]\npath = $/v/a\n");
+    const std::string path = m_dir / "v/a/x";
+    ASSERT_EQ("a " + (m_dir / "v/a"), Holding(path));
+    const std::string renamed = (m_dir / "etc/keld/new");
+    std::atomic<bool> isDone{false};
+    std::vector<std::thread> threads;
+    for (int i = 0; i < 4; ++i) {
+        threads.emplace_back([&] {
+            while (!isDone) {
+                EXPECT_EQ("a " + (m_dir / "v/a"), Holding(path));
+                KELDMountVolInfoFree(KELDMountVolAllEnum(0, 0));
+                const ShareOwner share("a");
+                EXPECT_EQ(0, share.Result());
+            }
+        });
+    }
+    for (int i = 0; i < 100; ++i) {
+        m_dir.Write("etc/keld/new", "[share a]\npath = " + (m_dir / "v/a") +
+                                        (i % 2 == 0 ? "\nrecycle_bin = yes\n" : "\n"));
+        EXPECT_EQ(0, rename(renamed.c_str(), (m_dir / "etc/keld/host.conf").c_str()));
+    }
+    isDone = true;
+    for (std::thread& thread : threads) thread.join();
 }
 
 TEST_F(Shares, OfTwoFoldersOfOneNameTheOneOnTheLowerVolumeIsTheShare) {

@@ -10,8 +10,10 @@
 
 #include "utils/unique-fd.h"
 
-// Makes `depth` folders called `name` below `path`, one in the other, each with a file "f".
-inline void MakeDeepTree(const std::string& path, int depth, const std::string& name) {
+// Makes `depth` folders called `name` below `path`, one in the other, with a file "f" in the last
+// one or, when asked, in each.
+inline void MakeDeepTree(const std::string& path, int depth, const std::string& name,
+                         bool has_file_in_each = false) {
     UniqueFd fd(open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
     for (int i = 0; i < depth; ++i) {
         ASSERT_EQ(0, mkdirat(fd.Get(), name.c_str(), 0777)) << i;

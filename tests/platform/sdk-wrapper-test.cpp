@@ -14,6 +14,8 @@
 #include "platform/keld-sdk-wrapper.h"
 #include "support/log-capture.h"
 #include "support/temp-dir.h"
+#include "utils/file-op.h"
+#include "utils/per-device-value.h"
 
 using testing::ElementsAre;
 using testing::IsEmpty;
@@ -87,18 +89,26 @@ TEST_F(SdkWrapperTest, OneThreadAtATimeIsInsideThePlatform) {
         std::this_thread::yield();
         --inside;
     };
-    m_fake.OnCall("KLIBScemdNotify", action);
-    m_fake.OnCall("KELDShareGet", action);
+    for (const char* call : {"KLIBScemdNotify", "KELDShareGet", "KLIBCFileGetKeyValue",
+                             "KLIBCFileSetKeyValue", "KELDEARemove"}) {
+        m_fake.OnCall(call, action);
+    }
     m_fake.AddShare({.name = "photos", .path = "/volume1/photos"});
-    const auto work = [] {
+    const auto work = [&](const std::string& name) {
+        const std::string device = m_dir.MakeDir(name);
+        m_dir.MakeDir(name + "/@eaDir");
         for (int i = 0; i < 300; ++i) {
             SDK::Share share;
             EXPECT_EQ(0, share.Open("photos"));
             EXPECT_EQ(0, SDK::NotifyLed(64));
+            std::string value;
+            EXPECT_TRUE(SetPerDeviceValue(device, "uuid", "u"));
+            EXPECT_TRUE(GetPerDeviceValue(device, "uuid", value));
+            EXPECT_EQ(0, FSRemove(m_dir.Write(name + "/file", "")));
         }
     };
-    std::thread first(work);
-    std::thread second(work);
+    std::thread first(work, "first");
+    std::thread second(work, "second");
     first.join();
     second.join();
     EXPECT_EQ(1, most);

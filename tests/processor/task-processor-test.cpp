@@ -1,6 +1,5 @@
 #include "processor/task-processor.h"
 
-#include <regex>
 #include <set>
 
 #include "event/event-manager.h"
@@ -197,8 +196,7 @@ TEST_F(TaskProcessorTest, AVersionTaskGetsADatedFolderThatIsIndexed) {
     m_worker.RunOnce();
     ASSERT_THAT(m_version_dirs, SizeIs(1));
     const std::string dir = *m_version_dirs.begin();
-    EXPECT_TRUE(std::regex_match(dir, std::regex("Ferrix Copy_\\d{4}-\\d\\d-\\d\\d_\\d{6}")))
-        << dir;
+    EXPECT_THAT(dir, testing::MatchesRegex("Ferrix Copy_[0-9]{4}-[0-9]{2}-[0-9]{2}_[0-9]{6}"));
     EXPECT_THAT(m_fake.Indexed(), ElementsAre(m_share + "/version/" + dir));
 }
 
