@@ -1,5 +1,7 @@
 // The rule that two imports may not share a destination.
+#include <algorithm>
 #include <list>
+#include <string_view>
 
 #include "daemon/app.h"
 #include "daemon/request-text.h"
@@ -13,8 +15,17 @@
 
 namespace {
 
-// With a slash at the end, so that a folder "/a" is no prefix of a folder "/ab".
-std::string WithSlash(const std::string& folder) { return folder == "/" ? folder : folder + "/"; }
+// With a slash at the end, so that a folder "/a" is no prefix of a folder "/ab". A folder has one
+// text only: what "//" and "/./" add leads to the same place.
+std::string WithSlash(std::string_view folder) {
+    std::string path = "/";
+    while (!folder.empty()) {
+        const std::string_view name = folder.substr(0, folder.find('/'));
+        folder.remove_prefix(std::min(name.size() + 1, folder.size()));
+        if (!name.empty() && name != ".") path.append(name).append(1, '/');
+    }
+    return path;
+}
 
 bool Overlap(const std::string& one, const std::string& other) {
     return one.starts_with(other) || other.starts_with(one);

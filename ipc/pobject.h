@@ -31,13 +31,15 @@ public:
     };
 
     using array_type = std::vector<PObject>;
-    // Byte-wise order, found without a call for two keys that differ at once.
+    // Byte-wise order, found without a call for two keys that differ early.
     struct KeyLess {
         using is_transparent = void;
         bool operator()(std::string_view a, std::string_view b) const {
-            if (!a.empty() && !b.empty() && a.front() != b.front()) {
-                return static_cast<unsigned char>(a.front()) <
-                       static_cast<unsigned char>(b.front());
+            const size_t common = a.size() < b.size() ? a.size() : b.size();
+            for (size_t i = 0; i < common && i < 8; ++i) {
+                if (a[i] != b[i]) {
+                    return static_cast<unsigned char>(a[i]) < static_cast<unsigned char>(b[i]);
+                }
             }
             return a < b;
         }

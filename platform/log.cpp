@@ -143,10 +143,10 @@ void LogClose() {
 void LogSetSink(LogSink sink) { g_sink = sink; }
 
 void LogWrite(int priority, const char* format, ...) {
+    const int saved_errno = errno;  // texts are often followed by a look at errno
     char stack_line[kStackLine];
     const LogSink sink = g_sink.load(std::memory_order_relaxed);
     const size_t header = sink != nullptr ? 0 : WriteHeader(stack_line, priority);
-    const int saved_errno = errno;  // texts are often followed by a look at errno
 
     va_list arguments;
     va_start(arguments, format);

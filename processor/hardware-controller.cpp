@@ -97,9 +97,11 @@ void HardwareController::NotifyHWController() {
     const int new_status = GetNewLedStatus();
     if (new_status == GetState().led) return;
 
+    // The pause first: a thread that reached the barrier before it would go on into its pass, and
+    // at the end of that forget the change as one that has been shown.
     Barrier barrier;
-    Abort(&barrier);
     Pause();
+    Abort(&barrier);
     barrier.Wait();
     SetLedStatus(new_status);
 }
@@ -170,7 +172,8 @@ void HardwareController::HandleHardwareControl() {
         m_state.beep = 0;
     }
     const WriteLock lock(m_status_lock);
-    m_state.is_dirty = false;
+    // What came meanwhile, with somebody else's resume, is for the next pass.
+    if (m_state.led == state.led) m_state.is_dirty = false;
     SLOG_DBG("HandleHardwareControl: cur_led_status = %d, cur_beep_status = %d\n", m_state.led,
              m_state.beep);
 }

@@ -72,8 +72,12 @@ int TaskEntryHandler::GetUSBEntry(uint64_t usb_id, USBRunInfo& entry) const {
 }
 
 int TaskEntryHandler::GetTaskEntry(uint64_t task_id, TaskRunInfo& entry) const {
+    // What the out was the last to hold is destroyed after the mutex is released.
+    TaskRunInfo copy;
     const MutexLock lock(m_mutex);
-    return CopyEntry(m_task_entries, task_id, entry);
+    if (CopyEntry(m_task_entries, task_id, copy) < 0) return -1;
+    std::swap(entry, copy);
+    return 0;
 }
 
 int TaskEntryHandler::GetUSBEntryByPath(const std::string& usb_share_path,

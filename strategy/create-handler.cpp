@@ -6,6 +6,7 @@
 
 #include "strategy/destination.h"
 #include "strategy/file-event-context.h"
+#include "strategy/root-check.h"
 #include "utils/error-code.h"
 #include "utils/file-op.h"
 #include "utils/log.h"
@@ -19,7 +20,9 @@ int CreateHandler::Handle() {
     const int result = RunCreate();
     if (result >= 0) return ERR_SUCCESS;
     SLOG_ERR("CreateHandler: failed to handle event '%s'", EventPath().c_str());
-    return result;
+    // A folder that cannot be made because a device is gone shall not be tried again and again.
+    const int gone = result == ERR_FILE_OPERATION ? CheckTaskRoots(Task()) : ERR_SUCCESS;
+    return gone < 0 ? gone : result;
 }
 
 int CreateHandler::RunCreate() {

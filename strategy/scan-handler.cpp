@@ -13,6 +13,13 @@ namespace {
 // As the lists are ordered: byte by byte; of two paths that begin alike the longer is the greater.
 int ComparePaths(const std::string& left, const std::string& right) { return left.compare(right); }
 
+// The outcome of a listing that broke off: a folder that cannot be read because its device is gone
+// shall not be tried again and again.
+int ListingFailure(const TaskRunInfo& task, int result) {
+    const int gone = result == ERR_IO ? CheckTaskRoots(task) : ERR_SUCCESS;
+    return gone < 0 ? gone : result;
+}
+
 }  // namespace
 
 int ScanHandler::Handle() {
@@ -22,11 +29,11 @@ int ScanHandler::Handle() {
     FileList dst_list(pool);
     if (const int result = GetSrcList(src_list); result < 0) {
         SLOG_ERR("ScanHandler: Failed to get src list '%s'", path);
-        return result;
+        return ListingFailure(Task(), result);
     }
     if (const int result = GetDstList(dst_list); result < 0) {
         SLOG_ERR("ScanHandler: Failed to get dst list '%s'", path);
-        return result;
+        return ListingFailure(Task(), result);
     }
     // After the listings: a folder that was listed while its device was still there is true.
     if (const int result = CheckTaskRoots(Task()); result < 0) return result;

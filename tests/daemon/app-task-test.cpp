@@ -398,6 +398,11 @@ TEST_F(AddTaskTest, FoldersThatOverlapAreRefusedAndOthersAreNot) {
         {"/",    "/a",   false},
         {"/a",   "/",    false},
         {"/a/b", "/a/c", true },
+        {"/a/",  "/a/b", false},
+        {"/a/b", "//a",  false},
+        {"/./a", "/a",   false},
+        {"//",   "/a",   false},
+        {"/a/",  "/ab",  true },
     };
     for (const char* folder : {"v1/photos/a/b", "v1/photos/a/c", "v1/photos/ab"}) {
         m_dir.MakeDir(folder);

@@ -13,6 +13,7 @@
 
 #include "deep-tree.h"
 #include "support/temp-dir.h"
+#include "utils/file-op.h"
 
 namespace {
 
@@ -102,6 +103,7 @@ TEST_P(ConfinedPathTest, ReachesPathsLongerThanOneCallTakes) {
     EXPECT_EQ(0, OpenErrno(path.substr((m_dir / "root").size() + 1)));
     EXPECT_EQ(ENOENT, OpenErrno(path.substr((m_dir / "root").size() + 1) + "x"));
     EXPECT_EQ(ENAMETOOLONG, OpenErrno(std::string(5000, 'x')));
+    EXPECT_EQ(0, FSRemove(m_dir / "root/folder"));
 }
 
 TEST_P(ConfinedPathTest, APlaceBelowARootIsConfined) {
@@ -151,6 +153,7 @@ TEST_P(ConfinedPathTest, ElsewhereLongPathsAreReachedToo) {
     EXPECT_FALSE(PathPlace(m_dir / std::string(5000, 'x')).Open(O_RDONLY).IsValid());
     EXPECT_EQ(ENAMETOOLONG, errno);
     EXPECT_EQ(ENAMETOOLONG, PathPlace(m_dir / std::string(5000, 'x') + "/a").Error());
+    EXPECT_EQ(0, FSRemove(m_dir / "folder"));
 }
 
 TEST_P(ConfinedPathTest, TheInnermostRootCounts) {

@@ -168,6 +168,15 @@ TEST_F(AcrossFileSystemsTest, ADeepFolderIsMoved) {
 
 // --- CopyFile
 
+TEST_F(FileOpChangeTest, CopyOfWhatIsNoFileLeavesTheDestinationAsItIs) {
+    const std::string to = m_dir.Write("to", "kept");
+    ASSERT_EQ(0, mkfifo((m_dir / "pipe").c_str(), 0600));
+    EXPECT_EQ(-1, CopyFile(m_dir / "pipe", to, true));
+    EXPECT_EQ(-1, CopyFile(m_dir.MakeDir("folder"), to, true));
+    EXPECT_EQ("kept", ReadWholeFile(to));
+    EXPECT_TRUE(FSExists(m_dir / "pipe"));
+}
+
 TEST_F(FileOpChangeTest, AFileIsCopied) {
     std::string content;
     for (int i = 0; i < 100000; ++i) content += "line " + std::to_string(i) + "\n";

@@ -36,6 +36,7 @@ protected:
         return true;
     }
     ~FSRemoveTest() override {
+        FakeKeld::Reset();  // its actions point into the test
         for (const std::string& path : m_immutable) {
             const UniqueFd fd(open(path.c_str(), O_RDONLY | O_CLOEXEC));
             int flags = 0;

@@ -194,6 +194,40 @@ TEST_F(HardwareControllerTest, AChangeWhilePausedReachesTheBarrier) {
     AwaitLed(10);
 }
 
+// Pauses only once the test lets it.
+class LatePauseController final : public HardwareController {
+public:
+    int Pause() override {
+        if (m_before_pause) m_before_pause();
+        return HardwareController::Pause();
+    }
+    std::function<void()> m_before_pause;
+};
+
+TEST_F(HardwareControllerTest, AChangeThatComesInTheMiddleOfAPassIsNotForgotten) {
+    Processor::SetWaitStepForTest(1);
+    std::atomic<int> sent{0};
+    m_fake.OnCall("KLIBScemdNotify", [&sent] {
+        ++sent;
+        usleep(20000);
+    });
+    InitDeviceSupport();
+    LatePauseController controller;
+    ASSERT_EQ(0, controller.Start());
+    TaskEventManager::GetInstance().PushEvent(904);
+    controller.NotifyHWController();
+    controller.m_before_pause = [&sent] {
+        for (const int before = sent; sent == before;) sched_yield();
+    };
+    TaskEventManager::GetInstance().RemoveEvent(904);
+    controller.NotifyHWController();
+    AwaitLed(65);
+    EXPECT_THAT(Codes(), ElementsAre(64, 65));
+    controller.Stop();
+    controller.Join();
+    m_fake.OnCall("KLIBScemdNotify", nullptr);
+}
+
 // The end of the daemon: the task worker may still tell of its last task.
 TEST_F(HardwareControllerTest, AStopNeverHangsWithNotifiersAtWork) {
     Processor::SetWaitStepForTest(100);

@@ -5,6 +5,7 @@
 #include "event/event-manager.h"
 #include "filter/file-filter.h"
 #include "platform/error-handler.h"
+#include "platform/keld-sdk-wrapper.h"
 #include "platform/package-paths.h"
 #include "processor/processor.h"
 #include "processor/task-event-manager.h"
@@ -141,6 +142,8 @@ uint64_t WorkerFixture::AddTask(const std::string& name, int task_type, int copy
     entry.hub_share_name = "photos";
     entry.src_dir_path = m_usb + "/" + name;
     entry.dst_dir_path = m_share + "/" + name;
+    entry.device_mount_path = m_usb;
+    EXPECT_EQ(0, SDK::GetDeviceIdentity(m_usb, entry.device_identity));
     entry.strategy_handler = m_strategy;
     entry.task_filter = std::make_shared<FileFilter>();
     entry.system_filter = std::make_shared<FileFilter>();

@@ -163,6 +163,14 @@ TEST_F(CreateHandlerTest, AConflictIsNotRemovedOnceTheDeviceIsGone) {
     EXPECT_EQ("theirs", ReadWholeFile(Dst("/a")));
 }
 
+TEST_F(CreateHandlerTest, AFolderThatAGoneDeviceRefusesIsNotRetried) {
+    MakeSrcDir("/a/b");
+    WriteDst("/a", "in the way of the parent");
+    m_fake.Pull(m_usb);
+    EXPECT_EQ(ERR_SRC_ROOT_MISS, Create("/a/b"));
+    EXPECT_TRUE(m_log.Has("[ERR] CreateHandler: failed to handle event '/a/b'"));
+}
+
 TEST_F(CreateHandlerTest, AFullDestinationIsToldSo) {
     if (geteuid() != 0) GTEST_SKIP() << "needs root to mount a small file system";
     if (mount("tmpfs", m_share.c_str(), "tmpfs", 0, "size=64k,nr_inodes=3") != 0) {

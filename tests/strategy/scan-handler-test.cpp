@@ -403,6 +403,22 @@ TEST_F(ScanHandlerTest, ADevicePulledAfterTheListingStillIssuesNothing) {
     EXPECT_THAT(TakeIssued(), IsEmpty());
 }
 
+TEST_F(ScanHandlerTest, AListingThatBreaksOffBecauseTheDeviceIsGoneIsNotRetried) {
+    WriteSrc("/a", "s");
+    WriteDst("/b", "s");
+    m_fake.Pull(m_usb);
+    // At the source, and at the destination behind the whole source: ".", "..", "a" and the end.
+    for (const int n : {0, 4}) {
+        g_entries_until_error = n;
+        EXPECT_EQ(ERR_SRC_ROOT_MISS, HandleScan("/")) << "at entry " << n;
+    }
+    g_entries_until_error = -1;
+    EXPECT_TRUE(m_log.Has("[ERR] ScanHandler: Failed to get src list '" + Src() + "'"));
+    EXPECT_TRUE(m_log.Has("[ERR] ScanHandler: Failed to get dst list '" + Src() + "'"));
+    EXPECT_EQ(ERROR_ACTION_DONE, ErrorActionOf(ERR_SRC_ROOT_MISS));
+    EXPECT_THAT(TakeIssued(), IsEmpty());
+}
+
 TEST_F(ScanHandlerTest, AnotherDeviceInItsPlaceCountsAsGone) {
     WriteDst("/a", "s");
     m_fake.AddDevice({.mount_path = m_usb, .dev_path = "/dev/sdc1"});

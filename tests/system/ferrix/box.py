@@ -91,6 +91,7 @@ class Box:
         self.devices, self.shares = [], {}
         self.extra_conf = ""
         self.daemon_pid = None
+        self.checks_leaks = True  # under the address sanitizer
         self.volume_loop = None
         self.log = LogDaemon() if log else None
         os.makedirs("/volume1", exist_ok=True)
@@ -156,7 +157,9 @@ class Box:
 
     def start(self, wrapper=(), wait=True):
         program = f"{PACKAGE}/target/sbin/ferrixd"
-        environment = dict(os.environ, ASAN_OPTIONS="log_path=/tmp/sanitizer:exitcode=99",
+        leaks = f"detect_leaks={int(self.checks_leaks)}"
+        environment = dict(os.environ,
+                           ASAN_OPTIONS=f"log_path=/tmp/sanitizer:exitcode=99:{leaks}",
                            UBSAN_OPTIONS="log_path=/tmp/sanitizer:print_stacktrace=1",
                            TSAN_OPTIONS="log_path=/tmp/sanitizer:exitcode=99")
         subprocess.run([*wrapper, program], check=True, env=environment)
