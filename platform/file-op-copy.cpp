@@ -94,10 +94,11 @@ int CopyFile(const std::string& from, const std::string& to, bool remove_source)
     const UniqueFd source = PathPlace(from).Open(O_RDONLY | O_NONBLOCK | O_NOCTTY);
     struct stat st {};
     if (!source.IsValid() || fstat(source.Get(), &st) != 0) return LogOpenFailure(from);
-    if (!S_ISREG(
-            st.st_mode)) {  // put in the file's place meanwhile: the destination stays as it is
-        errno = EINVAL;
-        return LogOpenFailure(from);
+    if (!S_ISREG(st.st_mode)) {
+        // Put in the file's place meanwhile: the destination stays as it is.
+        errno = S_ISDIR(st.st_mode) ? EISDIR : EINVAL;
+        SLOG_ERR("CopyFile: read: %s (%d)\n", std::strerror(errno), errno);
+        return -1;
     }
     const Buffer buffer(static_cast<char*>(std::malloc(kBufferBytes)));
     if (buffer == nullptr) {

@@ -113,8 +113,8 @@ def main():
     parser.add_argument("--fs", required=True)
     parser.add_argument("--stick", required=True)
     args = parser.parse_args()
-    os.mkdir("/tmp/world")
-    world.enter(str(HERE.parents[1]), "/tmp/world", extra=(args.install,))
+    os.mkdir("/mnt/world")
+    world.enter(str(HERE.parents[1]), "/mnt/world", extra=(args.install,))
     box = Box(args.install)
     try:
         scenario(box, args.fs, os.path.basename(args.stick))

@@ -2,7 +2,7 @@
 
 Debian's own kernel runs under software emulation with this machine's root folder mounted read-only,
 so every program here runs there too. A script of ours runs in it as root, with the stick's device
-in $STICK (formatted, not mounted) and tmpfs at /tmp and /mnt. A line YANK on its output pulls the
+in $STICK (formatted, not mounted) and a tmpfs at /mnt. A line YANK on its output pulls the
 stick, a line PLUG puts it back.
 """
 import fcntl
@@ -30,10 +30,9 @@ for m in {modules}; do modprobe $m 2>/dev/null; done
 mount -t 9p -o trans=virtio,version=9p2000.L,msize=262144,ro host /host || echo NO ROOT
 for k in proc sys dev; do mount --bind /$k /host/$k; done
 mount -t tmpfs t /host/mnt
-mount -t tmpfs t /host/tmp
-cp /job /host/tmp/job
+cp /job /host/mnt/job
 for i in 1 2 3 4 5 6 7 8 9; do [ -b /dev/sda ] && break; sleep 1; done
-chroot /host /bin/sh -c 'export PATH=/usr/sbin:/usr/bin:/sbin:/bin STICK=/dev/sda; . /tmp/job'
+chroot /host /bin/sh -c 'export PATH=/usr/sbin:/usr/bin:/sbin:/bin STICK=/dev/sda; . /mnt/job'
 echo "EXIT $?"
 poweroff -f
 """
