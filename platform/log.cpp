@@ -110,7 +110,8 @@ size_t WriteHeader(char* out, int priority) {
     }
     const int length = snprintf(out, kHeaderRoom, "<%d>%s %s: ", LOG_USER | priority, stamp,
                                 g_identity.load(std::memory_order_relaxed));
-    return static_cast<size_t>(length) < kHeaderRoom ? static_cast<size_t>(length) : kHeaderRoom - 1;
+    return static_cast<size_t>(length) < kHeaderRoom ? static_cast<size_t>(length)
+                                                     : kHeaderRoom - 1;
 }
 
 void Deliver(const char* data, size_t size) {
@@ -118,8 +119,9 @@ void Deliver(const char* data, size_t size) {
     if (lost != 0) {
         char note[256];
         const size_t header = WriteHeader(note, LOG_WARNING);
-        const int text = snprintf(note + header, sizeof(note) - header,
-                                  "[WARN] %s(%d): %u log lines were lost\n", __FILE__, __LINE__, lost);
+        const int text =
+            snprintf(note + header, sizeof(note) - header,
+                     "[WARN] %s(%d): %u log lines were lost\n", __FILE__, __LINE__, lost);
         if (Send(note, header + static_cast<size_t>(text))) g_lost -= lost;
     }
     if (!Send(data, size)) ++g_lost;

@@ -29,9 +29,9 @@ void LogWrite(int priority, const char* format, ...) __attribute__((format(print
 
 #define SLOG_STR2(x) #x
 #define SLOG_STR(x) SLOG_STR2(x)
-#define SLOG_AT(priority, tag, format, ...)                                                \
-    LogWrite(priority, tag " " __FILE__ "(" SLOG_STR(__LINE__) "): " format __VA_OPT__(, ) \
-                 __VA_ARGS__)
+#define SLOG_AT(priority, tag, format, ...) \
+    LogWrite(priority,                      \
+             tag " " __FILE__ "(" SLOG_STR(__LINE__) "): " format __VA_OPT__(, ) __VA_ARGS__)
 
 #define SLOG_DBG(...) SLOG_AT(LOG_DEBUG, "[DBG]", __VA_ARGS__)
 #define SLOG_INFO(...) SLOG_AT(LOG_INFO, "[INFO]", __VA_ARGS__)

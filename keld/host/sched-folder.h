@@ -5,8 +5,8 @@
 
 namespace keld_host {
 
-// Makes a folder and its parents, each with mode 0755 whatever the umask is; existing ones are left as
-// they are. Returns 0 or an errno.
+// Makes a folder and its parents, each with mode 0755 whatever the umask is; existing ones are left
+// as they are. Returns 0 or an errno.
 [[nodiscard]] int MakeFolders(const std::string& path);
 
 }  // namespace keld_host
