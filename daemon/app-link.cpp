@@ -6,13 +6,11 @@
 #include "daemon/usb-matcher.h"
 #include "db/log-db.h"
 #include "db/task-db.h"
-#include "event/event-manager.h"
 #include "ipc/pobject.h"
 #include "platform/global-setting.h"
 #include "processor/file-processor.h"
 #include "processor/hardware-controller.h"
 #include "processor/task-entry-handler.h"
-#include "processor/task-event-manager.h"
 #include "processor/task-processor.h"
 #include "utils/log.h"
 
@@ -87,11 +85,7 @@ void Ferrixd::DropAllEntries() {
     std::list<TaskRunInfo> tasks;
     registry.ListTaskEntries(tasks);
     PauseProcessors();
-    for (const TaskRunInfo& task : tasks) {
-        AbortTask(task.task_id);
-        EventManager::GetInstance().RemoveTask(task.task_id);
-        TaskEventManager::GetInstance().RemoveEvent(task.task_id);
-    }
+    for (const TaskRunInfo& task : tasks) DropTaskWork(task.task_id);
     for (const TaskRunInfo& task : tasks) registry.RemoveTaskEntry(task.task_id);
     std::list<USBRunInfo> devices;
     registry.ListUSBEntries(devices);

@@ -8,7 +8,6 @@
 #include "daemon/task-entry-loader.h"
 #include "daemon/usb-matcher.h"
 #include "db/task-db.h"
-#include "event/event-manager.h"
 #include "ipc/pobject.h"
 #include "platform/sdk-device.h"
 #include "platform/task-utils.h"
@@ -218,9 +217,7 @@ int Ferrixd::HandleVolumeUnmount(const PObject& request) {
 }
 
 void Ferrixd::DropTaskEntry(uint64_t usb_id, uint64_t task_id) {
-    AbortTask(task_id);
-    EventManager::GetInstance().RemoveTask(task_id);
-    TaskEventManager::GetInstance().RemoveEvent(task_id);
+    DropTaskWork(task_id);
     TaskEntryHandler::GetInstance().RemoveTaskEntry(task_id);
     std::list<TaskRunInfo> rest;
     TaskEntryHandler::GetInstance().ListTaskEntriesByUSB(usb_id, rest);

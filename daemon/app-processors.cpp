@@ -1,8 +1,10 @@
 // Control of the worker threads.
 #include "daemon/app.h"
+#include "event/event-manager.h"
 #include "processor/barrier.h"
 #include "processor/file-processor.h"
 #include "processor/hardware-controller.h"
+#include "processor/task-event-manager.h"
 #include "processor/task-processor.h"
 #include "utils/log.h"
 
@@ -47,4 +49,10 @@ void Ferrixd::AbortTask(uint64_t task_id) {
     task_processor->Abort(task_id, &barrier);
     file_processor->Abort(task_id, &barrier);
     barrier.Wait();
+}
+
+void Ferrixd::DropTaskWork(uint64_t task_id) {
+    AbortTask(task_id);
+    EventManager::GetInstance().RemoveTask(task_id);
+    TaskEventManager::GetInstance().RemoveEvent(task_id);
 }

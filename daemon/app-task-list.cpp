@@ -15,8 +15,6 @@
 
 namespace {
 
-constexpr int FOUND = 1;
-
 // What a task stands on at this moment.
 struct Mounts {
     bool is_usb_mounted = false;
@@ -110,10 +108,7 @@ std::string CopyFilePath(uint64_t task_id, const FileProcessor* file_processor) 
 int Ferrixd::GetTaskResponse(const TaskInfo& task_info, FileProcessor* file_processor,
                              PObject& response) {
     USBInfo usb_info;
-    if (TaskDB::GetInstance().GetUSBInfoByID(task_info.usb_id, usb_info) != FOUND) {
-        SetResponseError(RESPONSE_NO_SUCH_DEVICE, "USB id does not exist", response);
-        return -1;
-    }
+    if (!FindUSB(task_info.usb_id, usb_info, response)) return -1;
     const Mounts mounts = GetMounts(task_info.id);
     const std::string status = TaskStatus(task_info, mounts);
     SetSettings(task_info, response);

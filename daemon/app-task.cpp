@@ -7,10 +7,7 @@
 #include "daemon/request-text.h"
 #include "daemon/task-folder.h"
 #include "daemon/usb-matcher.h"
-#include "db/log-info.h"
-#include "db/log-wrapper.h"
 #include "db/task-db.h"
-#include "event/event-manager.h"
 #include "ipc/pobject.h"
 #include "platform/schedule.h"
 #include "platform/sdk-device.h"
@@ -18,7 +15,6 @@
 #include "platform/task-utils.h"
 #include "platform/utility.h"
 #include "processor/task-entry-handler.h"
-#include "processor/task-event-manager.h"
 #include "utils/file-op.h"
 #include "utils/log.h"
 
@@ -59,13 +55,6 @@ TaskInfo ReadTaskInfo(const PObject& request, uint64_t usb_id) {
     return task;
 }
 
-int AddTaskLog(const TaskInfo& task, LogDescription::ID id) {
-    LogInfo log;
-    log.SetTaskId(task.id);
-    log.SetDescription(id, task.task_name);
-    return AddLog(log);
-}
-
 }  // namespace
 
 int Ferrixd::AddTask(const PObject& request, PObject& response) {
@@ -81,10 +70,7 @@ int Ferrixd::AddTask(const PObject& request, PObject& response) {
     if (ScheduleTask(request, task_info, response) < 0) return -1;
     LogDump(TaskEntryHandler::GetInstance().ToString());
     response["task_id"] = task_info.id;
-    if (AddTaskLog(task_info, LogDescription::LOG_DESC_TASK_ADDED) < 0) {
-        SetResponseError(RESPONSE_DATABASE, "Failed to add log info to log db", response);
-        return -1;
-    }
+    if (!LogTask(task_info, LogDescription::LOG_DESC_TASK_ADDED, response)) return -1;
     SLOG_INFO("Add Task '%llu'\n", Llu(task_info.id));
     return 0;
 }
@@ -177,18 +163,13 @@ int Ferrixd::RemoveTask(const PObject& request, PObject& response) {
         return -1;
     }
     TaskInfo task_info;
-    if (TaskDB::GetInstance().GetTaskInfo(task_id, task_info) != FOUND) {
-        SetResponseError(RESPONSE_NO_SUCH_TASK, "Task id does not exist", response);
-        return -1;
-    }
+    if (!FindTask(task_id, task_info, response)) return -1;
     USBRunInfo usb;
     const bool is_plugged_in =
         TaskEntryHandler::GetInstance().GetUSBEntry(task_info.usb_id, usb) == 0;
 
     PauseProcessors();
-    AbortTask(task_id);
-    EventManager::GetInstance().RemoveTask(task_id);
-    TaskEventManager::GetInstance().RemoveEvent(task_id);
+    DropTaskWork(task_id);
     TaskEntryHandler::GetInstance().RemoveTaskEntry(task_id);
     RemoveTaskTraces(task_info, response);
     SLOG_INFO("Remove Task '%llu'\n", Llu(task_id));
@@ -211,9 +192,7 @@ void Ferrixd::RemoveTaskTraces(const TaskInfo& task_info, PObject& response) {
         SLOG_ERR("Failed to remove task folder '%s'\n", folder.c_str());
         SetResponseError(RESPONSE_OTHER, "Failed to remove task folder", response);
     }
-    if (AddTaskLog(task_info, LogDescription::LOG_DESC_TASK_REMOVED) < 0) {
-        SetResponseError(RESPONSE_DATABASE, "Failed to add log info to log db", response);
-    }
+    LogTask(task_info, LogDescription::LOG_DESC_TASK_REMOVED, response);
 }
 
 int Ferrixd::RemoveUSBInfo(uint64_t usb_id, PObject& response) {

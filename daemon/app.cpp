@@ -7,18 +7,36 @@
 
 Ferrixd::Ferrixd() {
     m_actions = {
-        {"stop",               &Ferrixd::DoUnlink        },
-        {"link",               &Ferrixd::DoLink          },
-        {"add_task",           &Ferrixd::AddTask         },
-        {"set_filter_setting", &Ferrixd::SetFilterSetting},
-        {"get_filter_setting", &Ferrixd::GetFilterSetting},
-        {"remove_task",        &Ferrixd::RemoveTask      },
-        {"list_task",          &Ferrixd::ListTask        },
-        {"list_entry",         &Ferrixd::ListEntry       },
+        {"stop",                     &Ferrixd::DoUnlink             },
+        {"link",                     &Ferrixd::DoLink               },
+        {"add_task",                 &Ferrixd::AddTask              },
+        {"enable_task",              &Ferrixd::EnableDefaultTask    },
+        {"run_task",                 &Ferrixd::RunTask              },
+        {"cancel_task",              &Ferrixd::CancelTask           },
+        {"set_task_setting",         &Ferrixd::SetTaskSetting       },
+        {"set_trigger_time_setting", &Ferrixd::SetTriggerTimeSetting},
+        {"set_filter_setting",       &Ferrixd::SetFilterSetting     },
+        {"get_task_setting",         &Ferrixd::GetTaskSetting       },
+        {"get_filter_setting",       &Ferrixd::GetFilterSetting     },
+        {"remove_task",              &Ferrixd::RemoveTask           },
+        {"disable_task",             &Ferrixd::DisableDefaultTask   },
+        {"list_task",                &Ferrixd::ListTask             },
+        {"list_entry",               &Ferrixd::ListEntry            },
+        {"set_global_setting",       &Ferrixd::SetGlobalSetting     },
     };
     m_hooks = {
-        {"post_mount",  &Ferrixd::HandleVolumeMount  },
-        {"pre_unmount", &Ferrixd::HandleVolumeUnmount},
+        {"post_mount",            &Ferrixd::HandleVolumeMount     },
+        {"pre_unmount",           &Ferrixd::HandleVolumeUnmount   },
+        {"post_ferrix",           &Ferrixd::HandleFerrix          },
+        {"pre_path_change",       &Ferrixd::HandleShareRemoveEntry},
+        {"post_path_change",      &Ferrixd::HandleSharePathChange },
+        {"pre_delete",            &Ferrixd::HandleShareDelete     },
+        {"pre_encrypt",           &Ferrixd::HandleShareUnmounted  },
+        {"post_decrypt",          &Ferrixd::HandleShareMounted    },
+        {"pre_snapshot_restore",  &Ferrixd::HandleShareRemoveEntry},
+        {"post_snapshot_restore", &Ferrixd::HandleShareReloadEntry},
+        {"pre_transform",         &Ferrixd::HandleShareRemoveEntry},
+        {"post_transform",        &Ferrixd::HandleShareReloadEntry},
     };
     InitDeviceSupport();
 }
@@ -30,10 +48,4 @@ Ferrixd::~Ferrixd() {
     if (m_has_app_thread) return;
     pthread_cond_destroy(&m_queue_cond);
     pthread_mutex_destroy(&m_queue_mutex);
-}
-
-void Ferrixd::SetResponseError(int code, const std::string& text, PObject& response) {
-    response.Clear();
-    response["error_code"] = code;
-    response["error"] = text;
 }

@@ -14,15 +14,19 @@
 #include <cstddef>
 #include <cstdint>
 #include <deque>
+#include <list>
 #include <map>
 #include <memory>
 #include <string>
+
+#include "db/log-description.h"
 
 class Barrier;
 class FileProcessor;
 class PObject;
 class Processor;
 struct TaskInfo;
+struct USBInfo;
 
 // The vocabulary of SetResponseError, known to clients; 7 is not used.
 enum ResponseCode : int {
@@ -91,6 +95,15 @@ private:
     void ResumeProcessors();
     // Returns when no worker is inside this task's work any more. The processors must be paused.
     void AbortTask(uint64_t task_id);
+    // Aborts the task and forgets what is queued of it. The processors must be paused.
+    void DropTaskWork(uint64_t task_id);
+
+    // --- What many commands need: app-request.cpp. False with the error set.
+    static bool ReadTaskId(const PObject& request, uint64_t& task_id, PObject& response);
+    static bool FindTask(uint64_t task_id, TaskInfo& task_info, PObject& response);
+    static bool FindUSB(uint64_t usb_id, USBInfo& usb_info, PObject& response);
+    // Adds a log row of a description that takes the task's name alone.
+    static bool LogTask(const TaskInfo& task_info, LogDescription::ID id, PObject& response);
 
     // --- Tasks: app-task.cpp
     int AddTask(const PObject& request, PObject& response);
@@ -120,6 +133,31 @@ private:
     // Null until "link".
     [[nodiscard]] FileProcessor* FirstFileProcessor() const;
 
+    // --- Runs: app-run.cpp
+    int RunTask(const PObject& request, PObject& response);
+    int CancelTask(const PObject& request, PObject& response);
+    int HandleFerrix(const PObject& request);
+
+    // --- Task settings: app-setting.cpp
+    int SetTaskSetting(const PObject& request, PObject& response);
+    int GetTaskSetting(const PObject& request, PObject& response);
+    int SetGlobalSetting(const PObject& request, PObject& response);
+    // What a request changes: the row, and what depends on it while the device is there. 0, or -1
+    // with the error set.
+    int SetTask(const PObject& request, uint64_t task_id, PObject& response);
+    int SetLiveTask(const TaskInfo& task_info, bool is_renamed, PObject& response);
+
+    // --- Triggers: app-trigger.cpp
+    int SetTriggerTimeSetting(const PObject& request, PObject& response);
+    // The device's half. 0, or -1 with the error set.
+    int SetUSB(const PObject& request, uint64_t usb_id, PObject& response);
+
+    // --- Default tasks: app-default-task.cpp
+    int EnableDefaultTask(const PObject& request, PObject& response);
+    int DisableDefaultTask(const PObject& request, PObject& response);
+    // Loads the entries of a default task if a device for it is there.
+    int LoadCandidate(uint64_t usb_id, PObject& response);
+
     // --- Filter settings: app-filter.cpp
     int SetFilterSetting(const PObject& request, PObject& response);
     int GetFilterSetting(const PObject& request, PObject& response);
@@ -142,6 +180,22 @@ private:
     void RemoveUSB(uint64_t usb_id);
     void ReleaseDefaultTask(const std::string& uuid);
     int LoadDefaultTaskEntry(const std::string& usb_share_path, const std::string& uuid);
+
+    // --- Shares: app-share.cpp
+    int HandleShareRemoveEntry(const PObject& request);
+    int HandleSharePathChange(const PObject& request);
+    int HandleShareReloadEntry(const PObject& request);
+    // Drops the entries that were loaded for another share than their rows name now.
+    void DropRenamedEntries(const std::list<TaskInfo>& tasks);
+
+    // --- Shares that are deleted: app-share-delete.cpp
+    int HandleShareDelete(const PObject& request);
+    void RemoveTaskOfShare(const TaskInfo& task);
+    void ClearTaskOfShare(const TaskInfo& task);
+
+    // --- Shares that are locked and unlocked: app-share-lock.cpp
+    int HandleShareUnmounted(const PObject& request);
+    int HandleShareMounted(const PObject& request);
 
     pthread_mutex_t m_queue_mutex = PTHREAD_MUTEX_INITIALIZER;
     pthread_cond_t m_queue_cond = PTHREAD_COND_INITIALIZER;

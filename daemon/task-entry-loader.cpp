@@ -4,6 +4,8 @@
 #include <memory>
 
 #include "daemon/task-folder.h"
+#include "daemon/task-settings.h"
+#include "db/file-db.h"
 #include "db/task-info.h"
 #include "filter/file-filter.h"
 #include "platform/package-paths.h"
@@ -12,15 +14,12 @@
 #include "platform/utility.h"
 #include "strategy/copy-strategy-handler.h"
 #include "strategy/task-run-info.h"
+#include "strategy/version-end.h"
 #include "utils/confined-path.h"
 #include "utils/log.h"
+#include "utils/path-util.h"
 
 namespace {
-
-std::string WithoutTrailingSlashes(std::string path) {
-    while (!path.empty() && path.back() == '/') path.pop_back();
-    return path;
-}
 
 // The name of the folder of a version task's present run; empty for other strategies. 0 or -1.
 int GetVersionDir(const TaskInfo& task, std::string& version_dir) {
@@ -44,8 +43,8 @@ int GetRoots(const TaskInfo& task, const std::string& usb_share_path, TaskRunInf
         SLOG_ERR("Failed to get src_dir_full_path and dst_dir_full_path\n");
         return -1;
     }
-    entry.src_dir_path = WithoutTrailingSlashes(entry.src_dir_path);
-    entry.dst_dir_path = WithoutTrailingSlashes(entry.dst_dir_path);
+    entry.src_dir_path = PathWithoutTrailingSlashes(entry.src_dir_path);
+    entry.dst_dir_path = PathWithoutTrailingSlashes(entry.dst_dir_path);
     entry.is_export = IsExportTask(task.task_type);
     const auto device_root = std::make_shared<const ConfinedRoot>(usb_share_path);
     const auto share_root = std::make_shared<const ConfinedRoot>(share_path);
@@ -60,6 +59,17 @@ int GetDevice(const std::string& usb_share_path, TaskRunInfo& entry) {
     entry.device_mount_path = usb_share_path;
     if (SDK::GetDeviceIdentity(usb_share_path, entry.device_identity) == 0) return 0;
     SLOG_ERR("Failed to get the identity of the device at '%s'\n", usb_share_path.c_str());
+    return -1;
+}
+
+// The memory of an incremental task; other tasks have none. 0 or -1.
+int OpenFileDB(const TaskInfo& task, TaskRunInfo& entry) {
+    if (task.copy_strategy != COPY_STRATEGY_INCREMENTAL) return 0;
+    const std::string path = FileDBPath(task.id);
+    entry.file_db = std::make_shared<FileDB>();
+    if (entry.file_db->Init(path) == 0) return 0;
+    SLOG_ERR("Failed to initiailize file db for task '%llu' at '%s'.\n", Llu(task.id),
+             path.c_str());
     return -1;
 }
 
@@ -83,27 +93,18 @@ int LoadFilters(uint64_t task_id, TaskRunInfo& entry) {
     return LoadWhiteList(*entry.task_filter, WhiteListPath(task_id));
 }
 
-void CopySettings(const TaskInfo& task, TaskRunInfo& entry) {
+void FillFromRow(const TaskInfo& task, TaskRunInfo& entry) {
     entry.task_id = task.id;
     entry.usb_id = task.usb_id;
-    entry.task_name = task.task_name;
     entry.status = TASK_RUN_STATE_IDLE;
     entry.copy_strategy = task.copy_strategy;
-    entry.hub_share_name = task.hub_share_name;
-    entry.keep_dir_structure = task.keep_dir_structure;
-    entry.smart_create_date_dir = task.smart_create_date_dir;
-    entry.rename_photo_video = task.rename_photo_video;
-    entry.remove_src_file = task.remove_src_file;
-    entry.conflict_policy = task.conflict_policy;
-    entry.enable_rotation = task.enable_rotation;
-    entry.max_version_count = task.max_version_count;
-    entry.rotation_policy = task.rotation_policy;
+    CopyTaskSettings(task, entry);
 }
 
 }  // namespace
 
 int BuildTaskEntry(const TaskInfo& task, const std::string& usb_share_path, TaskRunInfo& entry) {
-    const std::string mount_path = WithoutTrailingSlashes(usb_share_path);
+    const std::string mount_path = PathWithoutTrailingSlashes(usb_share_path);
     if (mount_path.empty() || !IsValidID(task.id)) {
         SLOG_ERR("Invalid parameter\n");
         return -1;
@@ -117,8 +118,10 @@ int BuildTaskEntry(const TaskInfo& task, const std::string& usb_share_path, Task
     if (GetVersionDir(task, built.version_dir) < 0) return -1;
     if (GetRoots(task, mount_path, built) < 0) return -1;
     if (GetDevice(mount_path, built) < 0) return -1;
+    if (OpenFileDB(task, built) < 0) return -1;
     if (LoadFilters(task.id, built) < 0) return -1;
-    CopySettings(task, built);
+    FillFromRow(task, built);
+    SettleVersionsAtLoad(built);
     SLOG_INFO("src_path '%s' and dst_path '%s' is ready (with task_id %llu)\n",
               built.src_dir_path.c_str(), built.dst_dir_path.c_str(), Llu(task.id));
     entry = std::move(built);

@@ -44,6 +44,8 @@ int MakeTaskFolder(uint64_t task_id) {
 
 std::string UserConfigPath(uint64_t task_id) { return TaskFile(task_id, "user.config"); }
 
+std::string FileDBPath(uint64_t task_id) { return TaskFile(task_id, "file-db.sqlite"); }
+
 std::string BlackListPath(uint64_t task_id) { return TaskFile(task_id, "blacklist.filter"); }
 
 std::string WhiteListPath(uint64_t task_id) { return TaskFile(task_id, "whitelist.filter"); }

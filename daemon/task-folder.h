@@ -12,6 +12,8 @@
 [[nodiscard]] int MakeTaskFolder(uint64_t task_id);
 // What the user named himself; for the client's display alone.
 [[nodiscard]] std::string UserConfigPath(uint64_t task_id);
+// What an incremental task has copied.
+[[nodiscard]] std::string FileDBPath(uint64_t task_id);
 // The lists that the task's filter applies.
 [[nodiscard]] std::string BlackListPath(uint64_t task_id);
 [[nodiscard]] std::string WhiteListPath(uint64_t task_id);

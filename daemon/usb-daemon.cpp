@@ -103,6 +103,7 @@ bool USBDaemon::ServeOneClient(const IPCListener& listener) {
     static_cast<void>(client.Release());  // the channel's now
 
     PStream stream;
+    stream.RefuseBinaries();  // no request has a file in it
     PObject request;
     if (stream.Recv(channel, request) < 0) {
         SLOG_ERR("Failed to recieve message from channel.\n");

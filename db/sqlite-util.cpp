@@ -118,6 +118,30 @@ int SqlQuery::Step() {
     return -1;
 }
 
+void SqlQuery::Bind(int parameter, const std::string& text) {
+    sqlite3_bind_text(m_statement, parameter, text.data(), static_cast<int>(text.size()),
+                      SQLITE_STATIC);
+}
+
+void SqlQuery::Bind(int parameter, int64_t value) {
+    sqlite3_bind_int64(m_statement, parameter, value);
+}
+
+int SqlQuery::Execute() {
+    const int code = sqlite3_step(m_statement);
+    const std::string message =
+        code == SQLITE_DONE || code == SQLITE_ROW ? std::string() : MessageOf(m_db, code);
+    Reset();
+    if (message.empty()) return 0;
+    SLOG_ERR("sqlite3_exec: [%d] %s\n", code, message.c_str());
+    return -1;
+}
+
+void SqlQuery::Reset() {
+    sqlite3_reset(m_statement);
+    sqlite3_clear_bindings(m_statement);
+}
+
 int64_t SqlQuery::Int64(int column) const { return sqlite3_column_int64(m_statement, column); }
 
 uint64_t SqlQuery::UInt64(int column) const { return static_cast<uint64_t>(Int64(column)); }

@@ -35,7 +35,7 @@ struct DatabaseOpenResult {
 [[nodiscard]] int ExecSql(sqlite3* db, const char* sql);
 [[nodiscard]] int ExecFormattedSql(sqlite3* db, const char* format, ...);
 
-// One statement that gives rows.
+// One statement, prepared for one use or for many.
 class SqlQuery {
 public:
     SqlQuery() = default;
@@ -45,8 +45,16 @@ public:
 
     // 0 or -1; once for each object.
     [[nodiscard]] int Prepare(sqlite3* db, const char* sql);
+    // The parameters, counted from 1. A text must live until Reset().
+    void Bind(int parameter, const std::string& text);
+    void Bind(int parameter, int64_t value);
     // 1 when there is a row to read, 0 at the end, -1 on failure.
     [[nodiscard]] int Step();
+    // Runs a statement that gives no rows, and resets it. 0 or -1.
+    [[nodiscard]] int Execute();
+    // Ends the use, and lets go of the parameters: a statement that still stands on a row keeps the
+    // database from being tidied up.
+    void Reset();
 
     // Columns of the present row, counted from 0. NULL is 0, false and the empty text.
     [[nodiscard]] int64_t Int64(int column) const;

@@ -147,6 +147,15 @@ size_t EventManager::GetScanEventCount(uint64_t task_id) {
     return pool != nullptr ? pool->GetScanEventCount() : 0;
 }
 
+size_t EventManager::GetHeldEventCount(uint64_t task_id) {
+    const MutexLock lock(m_mutex);
+    size_t count = 0;
+    for (const auto& [processor, event] : m_processor_events) {
+        if (event.task_id == task_id) ++count;
+    }
+    return count;
+}
+
 void EventManager::Traverse() {
     const MutexLock lock(m_mutex);
     for (const auto& [task_id, pool] : m_pools) {

@@ -47,6 +47,8 @@ public:
     // Events of the task, those in work included; 0 when it has no pool.
     [[nodiscard]] size_t GetEventCount(uint64_t task_id);
     [[nodiscard]] size_t GetScanEventCount(uint64_t task_id);
+    // Events of the task that workers have in hand.
+    [[nodiscard]] size_t GetHeldEventCount(uint64_t task_id);
     // Writes all pools to the log.
     void Traverse();
 

@@ -15,6 +15,7 @@ int Decode(const std::string& bytes, size_t read_limit, PObject& value) {
     MemoryChannel channel(bytes, 64);  // small rings: fields lie across their ends
     channel.pipe.read_limit = read_limit;
     PStream stream;
+    stream.RefuseBinaries();  // each would leave a file behind
     return stream.Recv(channel, value);
 }
 

@@ -31,28 +31,6 @@ void ClosePlain(void* handle) {
     delete static_cast<int*>(handle);
 }
 
-// 0 when the socket is ready, else the code to return.
-int WaitForSocket(int descriptor, bool for_writing, const timeval& timeout) {
-    for (;;) {
-        const int ready = WaitReady(descriptor, for_writing, timeout);
-        if (ready > 0) return 0;
-        if (ready == 0) {
-            SLOG_DBG("select: timeout\n");
-            return ERR_CONNECTION_TIMEOUT;
-        }
-        if (errno == EINTR) {
-            SLOG_DBG("select: EINTR\n");
-            continue;
-        }
-        if (for_writing) {
-            SLOG_ERR("select: %s\n", std::strerror(errno));
-        } else {
-            SLOG_ERR("select: [%d] %s\n", errno, std::strerror(errno));
-        }
-        return ERR_IO;
-    }
-}
-
 }  // namespace
 
 constinit const Channel::Transport Channel::kPlainTransport = {
@@ -68,6 +46,8 @@ constinit const Channel::Transport Channel::kPlainTransport = {
 };
 
 void Channel::SetFunctions(const Transport& transport) { m_transport = transport; }
+
+void Channel::SetFunctions(bool plain) { SetFunctions(plain ? kPlainTransport : kTlsTransport); }
 
 ssize_t Channel::ReadFd(int descriptor, void* buffer, size_t length, const timeval& timeout) {
     if (length == 0) {
@@ -89,7 +69,8 @@ ssize_t Channel::ReadFd(int descriptor, void* buffer, size_t length, const timev
 ssize_t Channel::WriteFd(int descriptor, const void* buffer, size_t length,
                          const timeval& timeout) {
     if (const int result = WaitForSocket(descriptor, true, timeout); result != 0) return result;
-    const ssize_t count = send(descriptor, buffer, length, 0);
+    // No signal for a peer that has gone: a client need not have arranged for it to be ignored.
+    const ssize_t count = send(descriptor, buffer, length, MSG_NOSIGNAL);
     if (count > 0) return count;
     SLOG_ERR("write: %s\n", std::strerror(count < 0 ? errno : 0));
     if (count == 0) {
@@ -100,6 +81,13 @@ ssize_t Channel::WriteFd(int descriptor, const void* buffer, size_t length,
     return ERR_IO;
 }
 
+bool Channel::RefuseWhenOpen() const {
+    if (IsClosed()) return false;
+    SLOG_ERR("Open: Channel already opened [%d]\n", m_transport.get_descriptor(m_handle));
+    SLOG_ERR("Open: %s\n", ErrorText(ERR_INVALID_ARGUMENT));
+    return true;
+}
+
 void Channel::Adopt(int descriptor) {
     m_handle = new int(descriptor);
     ResetRead();
@@ -107,11 +95,7 @@ void Channel::Adopt(int descriptor) {
 }
 
 int Channel::Open(int descriptor, bool tune) {
-    if (!IsClosed()) {
-        SLOG_ERR("Open: Channel already opened [%d]\n", m_transport.get_descriptor(m_handle));
-        SLOG_ERR("Open: %s\n", ErrorText(ERR_INVALID_ARGUMENT));
-        return ERR_INVALID_ARGUMENT;
-    }
+    if (RefuseWhenOpen()) return ERR_INVALID_ARGUMENT;
     if (tune) {
         if (SetLinger(descriptor, 1) != 0) {
             SLOG_ERR("Open: SetLinger to socket [%d] failed, %s\n", descriptor,
@@ -131,11 +115,7 @@ int Channel::Open(int descriptor, bool tune) {
 }
 
 int Channel::Open(const std::string& path) {
-    if (!IsClosed()) {
-        SLOG_ERR("Open: Channel already opened [%d]\n", m_transport.get_descriptor(m_handle));
-        SLOG_ERR("Open: %s\n", ErrorText(ERR_INVALID_ARGUMENT));
-        return ERR_INVALID_ARGUMENT;
-    }
+    if (RefuseWhenOpen()) return ERR_INVALID_ARGUMENT;
     UniqueFd descriptor(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
     if (!descriptor.IsValid()) {
         SLOG_ERR("Channel: Can not open socket. %s\n", std::strerror(errno));
@@ -164,7 +144,8 @@ void Channel::Close() {
     }
     m_transport.close(m_handle);
     m_handle = nullptr;
-    SetFunctions(kPlainTransport);
+    m_is_tls = false;
+    SetFunctions(true);
 }
 
 int Channel::SetLinger(int descriptor, int seconds) const {

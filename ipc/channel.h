@@ -1,11 +1,11 @@
 // A buffered stream socket: two rings of equal capacity, a limit on each wait for the socket, and a
-// limit on silence.
+// limit on silence. The bytes travel as they are, or through TLS.
 //
 // Threads: a channel belongs to one thread; only the abort flag may be set by another.
 // Ownership: an open channel owns its descriptor; the destructor flushes and closes.
 // Results: 0, or a negative ErrorCode ("utils/error-code.h"): ERR_IO, ERR_SYSTEM,
-// ERR_INVALID_ARGUMENT, ERR_CONNECTION_TIMEOUT; -1 when the abort flag ended the operation.
-// Integers are big-endian on the wire.
+// ERR_INVALID_ARGUMENT, ERR_CONNECTION_TIMEOUT, ERR_SSL_VERIFY; -1 when the abort flag ended the
+// operation. Integers are big-endian on the wire.
 #pragma once
 
 #include <sys/time.h>
@@ -17,6 +17,10 @@
 #include <memory>
 #include <string>
 #include <string_view>
+
+class StallCount;
+struct ssl_ctx_st;  // OpenSSL's SSL_CTX
+struct ssl_st;      // OpenSSL's SSL
 
 class Channel {
 public:
@@ -33,6 +37,8 @@ public:
     // Takes a connected descriptor over, only on success. `tune` sets linger to one second and
     // makes the descriptor non-blocking.
     [[nodiscard]] virtual int Open(int descriptor, bool tune);
+    // Connects over IPv4. Without an ip or with a negative port it does nothing and returns 0.
+    [[nodiscard]] virtual int Open(const char* ip, int port);
     // Flushes what is pending, shuts the socket down and closes it. Harmless on a closed channel.
     virtual void Close();
 
@@ -40,6 +46,20 @@ public:
     virtual void SetTimeout(unsigned seconds);
     // An operation that waits ends with -1 within a second after *flag is set. May be null.
     virtual void SetAbortFlag(const std::atomic<int>* flag);
+
+    // From now on the open connection speaks TLS; `server` says which end this one is. Nothing to
+    // do when it does already. Flush before: what is pending is sent inside TLS, what was received
+    // before is dropped. After a failure the channel is good only for closing.
+    // A client checks the server's certificate against the trusted ones only when verification is
+    // not skipped, and never the name in it. SIGPIPE has to be ignored by the process.
+    [[nodiscard]] virtual int ConvertToSSLChannel(bool server);
+    // True, as at first: any certificate will do. Else one that is not trusted fails a conversion
+    // with ERR_SSL_VERIFY.
+    void SkipVerification(bool skip) { m_skip_verify = skip; }
+    // Files in PEM form for the conversions of all channels: a server's certificate and private
+    // key, and the certificates that a client trusts. Not while another thread converts.
+    static void SetCertificatePaths(const std::string& certificate, const std::string& key,
+                                    const std::string& trusted);
 
     [[nodiscard]] virtual int ReadU8(uint8_t* value);
     [[nodiscard]] virtual int ReadU16(uint16_t* value);
@@ -61,6 +81,9 @@ public:
     virtual void ResetWrite();
     // Sends at least so many of the pending bytes; 0 is all.
     [[nodiscard]] virtual int FlushWrite(size_t at_least);
+    // The address of the other end. A closed channel gives an empty ip and 0, with success; -1 for
+    // a peer that has no IPv4 address.
+    [[nodiscard]] virtual int GetPeerInfo(std::string& ip, int& port) const;
     [[nodiscard]] virtual bool IsClosed() const;
     // Fills the read ring with at least `want` more bytes, and with what else is there.
     [[nodiscard]] virtual int ReadMore(size_t want);
@@ -69,8 +92,12 @@ public:
     [[nodiscard]] virtual uint32_t SwapU32(uint32_t value) const;
     [[nodiscard]] virtual uint16_t SwapU16(uint16_t value) const;
 
+    // A TCP socket, or -1.
+    [[nodiscard]] virtual int CreateSocket() const;
     [[nodiscard]] virtual int SetLinger(int descriptor, int seconds) const;
     [[nodiscard]] virtual int SetNonBlock(int descriptor) const;
+    // Connects a non-blocking socket, waiting for a third of the seconds of the total timeout.
+    [[nodiscard]] virtual int Connect(int descriptor, const char* ip, int port);
 
     // What the read ring holds in one piece, from the oldest byte on; empty when the ring is. A
     // decoder takes its small fields out of it, without a call of Read for each.
@@ -95,13 +122,32 @@ protected:
     static ssize_t WriteFd(int descriptor, const void* buffer, size_t length,
                            const timeval& timeout);
 
-    virtual void SetFunctions(const Transport& transport);
-    static const Transport kPlainTransport;
+    // The same through TLS, whose records may make several waits of one operation necessary.
+    static ssize_t SSLReadFd(ssl_st* ssl, void* buffer, size_t length, const timeval& timeout);
+    static ssize_t SSLWriteFd(ssl_st* ssl, const void* buffer, size_t length,
+                              const timeval& timeout);
 
-    void* m_handle = nullptr;  // on the plain transport a heap int; null when closed
+    virtual void SetFunctions(const Transport& transport);
+    virtual void SetFunctions(bool plain);
+    static const Transport kPlainTransport;
+    static const Transport kTlsTransport;
+
+    void* m_handle = nullptr;           // null when closed; plain: a heap int, TLS: the ssl_st
+    timeval m_operation_timeout{1, 0};  // so that the abort flag and the total are looked at
 
 private:
+    [[nodiscard]] bool RefuseWhenOpen() const;
     void Adopt(int descriptor);
+    [[nodiscard]] int WaitForConnect(int descriptor) const;
+    // Makes both ends of what OpenSSL needs, or neither. The caller frees them.
+    [[nodiscard]] static int InitSSL(ssl_st*& ssl, ssl_ctx_st*& context, bool server);
+    [[nodiscard]] int StartSSL(ssl_st* ssl);
+    [[nodiscard]] int SSLHandshake(ssl_st* ssl, const timeval& timeout, unsigned total) const;
+    [[nodiscard]] int WaitForHandshake(ssl_st* ssl, bool for_writing, const timeval& timeout,
+                                       StallCount& stalls) const;
+    template <typename Move>
+    [[nodiscard]] static int MoveThroughSSL(ssl_st* ssl, bool for_writing, const timeval& timeout,
+                                            const Move& move);
     size_t TakeBuffered(uint8_t* out, size_t length);
     void CopyIntoWriteRing(const uint8_t* bytes, size_t length);
     [[nodiscard]] bool IsAborted() const;
@@ -115,7 +161,12 @@ private:
     size_t r_head = 0;
     size_t r_size = 0;
     size_t m_capacity;
-    timeval m_operation_timeout{1, 0};  // so that the abort flag and the total are looked at
-    unsigned m_total_timeout = 60;      // seconds
+    unsigned m_total_timeout = 60;  // seconds
     const std::atomic<int>* m_abort_flag = nullptr;
+    bool m_is_tls = false;
+    bool m_skip_verify = true;
+
+    static std::string m_cert_path;
+    static std::string m_key_path;
+    static std::string m_ca_path;
 };

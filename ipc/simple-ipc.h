@@ -1,4 +1,4 @@
-// The listening end of a domain socket.
+// The listening end of a domain socket, or of a port of 127.0.0.1.
 //
 // Threads: belongs to one thread. Ownership: owns the descriptor and the socket file; the
 // destructor stops listening and removes the file.
@@ -19,6 +19,13 @@ public:
     // Listens at a path, replacing a file left there. Returns 0 or -1; -1 when it already listens,
     // and the first socket stays.
     [[nodiscard]] int Listen(const std::string& path);
+    // Listens on this one port, which is above 0. Returns 0 or -1; -1 when it already listens, and
+    // the first socket stays.
+    [[nodiscard]] int Listen(int port);
+    // Listens on the first free port from this one upwards, 0 being any that the system chooses.
+    // What it listened on before is closed first. Returns the port in use, or -1 and does not
+    // listen.
+    [[nodiscard]] int ListenOnPort(int first_port);
     // True when a client is ready; false after the timeout, a signal or an error.
     [[nodiscard]] bool Wait() const;
     // A connected descriptor that the caller owns, or -1.
@@ -27,7 +34,10 @@ public:
     void Stop();
 
 private:
+    [[nodiscard]] int MakePortSocket();
+    [[nodiscard]] int StartOnPort();
+
     timeval m_wait_timeout;
     int m_descriptor = -1;
-    std::string m_path;  // empty while not listening
+    std::string m_path;  // empty while not listening or listening on a port
 };

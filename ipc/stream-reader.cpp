@@ -2,7 +2,9 @@
 
 #include <cstring>
 
+#include "ipc/binary-transfer.h"
 #include "ipc/channel.h"
+#include "ipc/tmp-name-gen.h"
 #include "ipc/wire-tag.h"
 #include "utils/error-code.h"
 #include "utils/log.h"
@@ -17,6 +19,7 @@ int PStream::Reader::Read(PObject& value) {
 int PStream::Reader::ReadTree(PObject& root) {
     uint8_t tag = 0;
     if (const int result = TakeByte(&tag); result != 0) return result;
+    if (root.IsContainer() || root.IsBinary()) m_former.Swap(root);
     for (PObject* value = &root;;) {
         if (tag == TAG_ARRAY || tag == TAG_MAP) {
             OpenContainer(*value, tag == TAG_MAP);
@@ -102,6 +105,9 @@ int PStream::Reader::ReadLeaf(uint8_t tag, PObject& target) {
             target = text;
             return 0;
         }
+        case TAG_BINARY:
+            if (m_stream.m_takes_binaries) return ReadBinary(target);
+            [[fallthrough]];
         default:
             SLOG_ERR("PStream: unknown tag %u\n", tag);
     }
@@ -150,6 +156,36 @@ int PStream::Reader::ReadString(std::string_view& text) {
     }
     text = {bytes, length == 0 ? 0 : strnlen(bytes, length)};
     return 0;
+}
+
+int PStream::Reader::ReadBinary(PObject& target) {
+    uint8_t head[sizeof(uint64_t)];
+    if (const int result = Take(head, sizeof(head)); result != 0) return result;
+    uint64_t length = 0;
+    for (const uint8_t byte : head) length = length << 8 | byte;
+    ReturnPiece();
+    PublishKey();
+    PObject::binary_type record = FormerTarget().AsBinary();
+    const int result =
+        BinaryReceiver(m_channel, TmpNameGen::Instance(), m_stream.m_temp_directory,
+                       [this](uint64_t total, uint64_t done) { m_stream.SetProgress(total, done); })
+            .Receive(length, record);
+    SLOG_DBG("%sbinary has been stored at '%s' with length %llu\n", m_stream.Indent(),
+             record.path.c_str(), Llu(record.length));
+    target = record;
+    return result;
+}
+
+// What stood in the caller's value where the present child stands. Found only when it is asked for,
+// by the keys on the error stack, so that values without binaries cost nothing.
+const PObject& PStream::Reader::FormerTarget() const {
+    const PObject* former = &m_former;
+    size_t key = 0;
+    for (const PObject* level : m_levels) {
+        former = level->IsMap() ? &(*former)[m_stream.m_error_stack[key++]]
+                                : &(*former)[static_cast<int>(level->AsArray().size() - 1)];
+    }
+    return *former;
 }
 
 int PStream::Reader::TakeByte(uint8_t* out) {

@@ -28,6 +28,8 @@ private:
     [[nodiscard]] int ReadNull(PObject& target);
     [[nodiscard]] int ReadInteger(PObject& target);
     [[nodiscard]] int ReadString(std::string_view& text);
+    [[nodiscard]] int ReadBinary(PObject& target);
+    [[nodiscard]] const PObject& FormerTarget() const;
     [[nodiscard]] int Take(void* out, size_t length);
     [[nodiscard]] int TakeByte(uint8_t* out);
     [[nodiscard]] bool HasInPiece(size_t length) const { return m_piece.size() >= length; }
@@ -44,5 +46,6 @@ private:
     // The key of the member being read, while it is not on the error stack: it goes there only
     // before anything that may wait or fail. Most members are over before anybody could look.
     const std::string* m_unpublished_key = nullptr;
+    PObject m_former;  // what the caller's value held: it may say where binaries are stored
     std::vector<PObject*> m_levels;  // the containers being filled, outermost first
 };

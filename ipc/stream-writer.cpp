@@ -2,6 +2,7 @@
 
 #include <cstring>
 
+#include "ipc/binary-transfer.h"
 #include "ipc/channel.h"
 #include "ipc/wire-tag.h"
 #include "utils/error-code.h"
@@ -86,6 +87,8 @@ int PStream::Writer::WriteLeaf(const PObject& value) {
             return WriteInteger(value.AsUInt64());
         case PObject::KIND_STRING:
             return WriteString(value.StringView());
+        case PObject::KIND_BINARY:
+            return WriteBinary(value.AsBinary());
         default:
             SLOG_ERR("PStream: a value of kind %d can not be sent\n", value.GetKind());
     }
@@ -109,6 +112,18 @@ int PStream::Writer::WriteString(std::string_view bytes) {
                             static_cast<uint8_t>(bytes.size())};
     if (const int result = Put(head, sizeof(head)); result != 0) return result;
     return Put(bytes.data(), bytes.size());
+}
+
+// A file that cannot be read fails only after the tag and the length: the peer is left waiting.
+int PStream::Writer::WriteBinary(const PObject::binary_type& record) {
+    uint8_t head[1 + sizeof(record.length)] = {TAG_BINARY};
+    for (unsigned i = 1; i < sizeof(head); ++i) {
+        head[i] = static_cast<uint8_t>(record.length >> (8 * (sizeof(head) - 1 - i)));
+    }
+    if (const int result = Put(head, sizeof(head)); result != 0) return result;
+    if (const int result = Drain(); result != 0) return result;
+    return SendBinary(m_channel, record,
+                      [this](uint64_t total, uint64_t done) { m_stream.SetProgress(total, done); });
 }
 
 int PStream::Writer::Put(const void* bytes, size_t length) {

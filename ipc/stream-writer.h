@@ -33,6 +33,7 @@ private:
     [[nodiscard]] int WriteLeaf(const PObject& value);
     [[nodiscard]] int WriteInteger(uint64_t value);
     [[nodiscard]] int WriteString(std::string_view bytes);
+    [[nodiscard]] int WriteBinary(const PObject::binary_type& record);
     [[nodiscard]] int Put(const void* bytes, size_t length);
     [[nodiscard]] int Drain();
     [[nodiscard]] int Checked(int channel_result) const;

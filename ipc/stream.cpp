@@ -37,6 +37,12 @@ void PStream::PopKey() {
     --m_key_count;
 }
 
+void PStream::SetProgress(uint64_t total, uint64_t done) {
+    const MutexLock lock(m_mutex);
+    m_total_bytes = total;
+    m_done_bytes = done;
+}
+
 // The first key stands there twice: the text is known in this form.
 std::string PStream::ErrorPathLocked() const {
     if (m_key_count == 0) return {};

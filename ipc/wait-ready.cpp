@@ -3,6 +3,10 @@
 #include <poll.h>
 
 #include <cerrno>
+#include <cstring>
+
+#include "utils/error-code.h"
+#include "utils/log.h"
 
 // poll(2), not select(2): a set of select has room for the first 1024 descriptors only, and a
 // higher number writes past it.
@@ -19,4 +23,25 @@ int WaitReady(int descriptor, bool for_writing, const timeval& timeout) {
         return -1;
     }
     return ready;
+}
+
+int WaitForSocket(int descriptor, bool for_writing, const timeval& timeout) {
+    for (;;) {
+        const int ready = WaitReady(descriptor, for_writing, timeout);
+        if (ready > 0) return 0;
+        if (ready == 0) {
+            SLOG_DBG("select: timeout\n");
+            return ERR_CONNECTION_TIMEOUT;
+        }
+        if (errno == EINTR) {
+            SLOG_DBG("select: EINTR\n");
+            continue;
+        }
+        if (for_writing) {
+            SLOG_ERR("select: %s\n", std::strerror(errno));
+        } else {
+            SLOG_ERR("select: [%d] %s\n", errno, std::strerror(errno));
+        }
+        return ERR_IO;
+    }
 }

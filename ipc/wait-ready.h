@@ -6,3 +6,7 @@
 // Waits until the descriptor can be read or written, or something is wrong with it.
 // 1: ready; 0: timeout, or a wake without a cause; -1: failure, in errno (EINTR: a signal).
 [[nodiscard]] int WaitReady(int descriptor, bool for_writing, const timeval& timeout);
+
+// The same for a transport of Channel, signals passed over: 0 when it is ready, else, logged,
+// ERR_CONNECTION_TIMEOUT or ERR_IO.
+[[nodiscard]] int WaitForSocket(int descriptor, bool for_writing, const timeval& timeout);

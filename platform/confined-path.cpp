@@ -11,6 +11,8 @@
 #include <atomic>
 #include <cerrno>
 #include <climits>
+#include <cstdint>
+#include <ctime>
 #include <map>
 #include <optional>
 #include <vector>
@@ -96,10 +98,16 @@ UniqueFd OpenPiece(int dir_fd, std::string_view relative, int flags, mode_t mode
 class KeptFolders {
 public:
     static bool IsOn() { return s_depth > 0; }
-    static void Enter() { ++s_depth; }
-    static void Leave() {
-        if (--s_depth == 0) s_folders.clear();
+    static void Enter() {
+        if (s_depth++ > 0) return;
+        s_is_kept_for_next = false;
+        if (s_folders.size() > kMostToStartWith || NowMs() - s_opened >= PLACE_KEEP_MS) Close();
     }
+    static void Leave() {
+        if (--s_depth == 0 && !s_is_kept_for_next) Close();
+    }
+    static void KeepForNext() { s_is_kept_for_next = true; }
+    static void Close() { s_folders.clear(); }
     static int Find(std::string_view root, std::string_view folder) {
         for (const Folder& kept : s_folders) {
             if (kept.root_size == root.size() && kept.path == folder) return kept.fd.Get();
@@ -110,6 +118,7 @@ public:
     // thrown out for a new one: a place may still use it.
     static int Keep(std::string_view root, std::string_view folder, UniqueFd& fd) {
         if (s_folders.size() >= kMost) return AT_FDCWD;
+        if (s_folders.empty()) s_opened = NowMs();
         const int number = fd.Get();
         s_folders.push_back({root.size(), std::string(folder), std::move(fd)});
         return number;
@@ -122,13 +131,33 @@ private:
         UniqueFd fd;
     };
     static constexpr size_t kMost = 8;  // source, destination, and the folders above them
+    static constexpr size_t kMostToStartWith = 5;  // leaves room for those of another folder
+
+    static int64_t NowMs() {
+        timespec now{};
+        clock_gettime(CLOCK_MONOTONIC_COARSE, &now);
+        return static_cast<int64_t>(now.tv_sec) * 1000 + now.tv_nsec / 1000000;
+    }
 
     static thread_local int s_depth;
+    static thread_local bool s_is_kept_for_next;
+    static thread_local int64_t s_opened;  // the first of them
     static thread_local std::vector<Folder> s_folders;
 };
 
 thread_local int KeptFolders::s_depth = 0;
+thread_local bool KeptFolders::s_is_kept_for_next = false;
+thread_local int64_t KeptFolders::s_opened = 0;
 thread_local std::vector<KeptFolders::Folder> KeptFolders::s_folders;
+
+// The open folder of a root, or -1 with errno. `owner` closes it unless the thread's scope does.
+int OpenRoot(std::string_view root, std::string_view kept_as, UniqueFd& owner) {
+    if (const int kept = KeptFolders::Find(root, kept_as); kept >= 0) return kept;
+    owner.Reset(open(std::string(root).c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
+    const int fd = owner.Get();
+    if (owner.IsValid() && KeptFolders::IsOn()) KeptFolders::Keep(root, kept_as, owner);
+    return fd;
+}
 
 }  // namespace
 
@@ -207,22 +236,30 @@ void PathPlace::Reach(std::string_view root, const std::string& path) {
         m_base = kept;
         return;
     }
-    UniqueFd base(open(std::string(root).c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
-    if (base.IsValid() && folder.empty()) {
-        m_dir = std::move(base);
-    } else if (base.IsValid()) {
-        m_dir = OpenBeneath(base.Get(), folder, O_PATH | O_DIRECTORY);
-    }
-    if (!m_dir.IsValid()) {
+    UniqueFd root_dir;
+    const int base = OpenRoot(root, std::string_view(path).substr(0, root.size() + 1), root_dir);
+    if (base < 0) {
         m_error = errno;
-    } else if (KeptFolders::IsOn()) {
-        m_base = KeptFolders::Keep(root, folder_path, m_dir);
+    } else if (folder.empty()) {
+        m_dir = std::move(root_dir);
+        m_base = base;
+    } else {
+        m_dir = OpenBeneath(base, folder, O_PATH | O_DIRECTORY);
+        if (!m_dir.IsValid()) {
+            m_error = errno;
+        } else if (KeptFolders::IsOn()) {
+            m_base = KeptFolders::Keep(root, folder_path, m_dir);
+        }
     }
 }
 
 PathPlaceScope::PathPlaceScope() { KeptFolders::Enter(); }
 
 PathPlaceScope::~PathPlaceScope() { KeptFolders::Leave(); }
+
+void PathPlaceScope::KeepForNext() { KeptFolders::KeepForNext(); }
+
+void PathPlaceScope::CloseKept() { KeptFolders::Close(); }
 
 // A path that no single call takes: its folders are opened in pieces, links followed as usual.
 void PathPlace::ReachLong(const std::string& path) {

@@ -21,6 +21,11 @@ std::string PathAddTrailingSlash(std::string_view path) {
     return result;
 }
 
+std::string PathWithoutTrailingSlashes(std::string_view path) {
+    while (!path.empty() && path.back() == '/') path.remove_suffix(1);
+    return std::string(path);
+}
+
 std::string PathDirName(std::string_view path) {
     const size_t slash = path.rfind('/');
     if (slash == path.npos) return ".";

@@ -1,12 +1,16 @@
 #include "platform/request-setting.h"
 
+#include <cstring>
+
 #include "ipc/pobject.h"
 
 // A missing key reads as the empty value of the type.
 
 bool GetChangedString(const PObject& request, const std::string& key, const std::string& old_value,
                       std::string& value) {
-    const std::string sent = request[key].AsString();
+    // Up to the first NUL byte: that much of a text is stored.
+    std::string sent = request[key].AsString();
+    sent.resize(std::strlen(sent.c_str()));
     const bool is_changed = !sent.empty() && sent != old_value;
     value = sent;
     return is_changed;

@@ -9,7 +9,7 @@
 
 class PObject;
 
-// An empty text counts as not sent.
+// An empty text counts as not sent; a text ends at its first NUL byte.
 [[nodiscard]] bool GetChangedString(const PObject& request, const std::string& key,
                                     const std::string& old_value, std::string& value);
 [[nodiscard]] bool GetChangedBool(const PObject& request, const std::string& key, bool old_value,

@@ -12,10 +12,10 @@
 #include <ctime>
 #include <limits>
 
+#include "platform/durable-file.h"
 #include "platform/global-setting.h"
 #include "utils/confined-path.h"
 #include "utils/log.h"
-#include "utils/unique-fd.h"
 
 namespace {
 
@@ -28,38 +28,16 @@ std::string TaskFolder(uint64_t task_id) {
     return GetRepoVolPath() + "/@Ferrix/task/" + std::to_string(task_id);
 }
 
-// 1 with the record, 0 when there is none, -1 when it cannot be told.
-int ReadRecord(const std::string& path, char* text, size_t size) {
-    const UniqueFd file(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW));
-    if (!file.IsValid()) return errno == ENOENT ? 0 : -1;
-    const ssize_t length = read(file.Get(), text, size - 1);
-    if (length < 0) return -1;
-    text[length] = '\0';
-    return 1;
-}
-
-bool IsWritten(const std::string& path, const char* text, size_t length) {
-    UniqueFd file(open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC | O_NOFOLLOW, 0600));
-    if (!file.IsValid()) return false;
-    if (write(file.Get(), text, length) != static_cast<ssize_t>(length)) return false;
-    return fsync(file.Get()) == 0 && file.Close() == 0;
-}
-
-bool IsFolderSynced(const std::string& folder) {
-    const UniqueFd dir(open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-    return dir.IsValid() && fsync(dir.Get()) == 0;
-}
-
 }  // namespace
 
 UnprovenRun::UnprovenRun(uint64_t task_id) : m_folder(TaskFolder(task_id)) {
-    char text[80];
-    const int found = ReadRecord(m_folder + RECORD_NAME, text, sizeof(text));
+    std::string text;
+    const int found = ReadDurableFile(m_folder + RECORD_NAME, text);
     if (found == 0) return;
     char end = '\0';
     if (found < 0 ||
-        std::sscanf(text, "%" SCNd64 " %" SCNd64 " %" SCNd64 "%c", &m_from, &m_until, &m_open,
-                    &end) != 4 ||
+        std::sscanf(text.c_str(), "%" SCNd64 " %" SCNd64 " %" SCNd64 "%c", &m_from, &m_until,
+                    &m_open, &end) != 4 ||
         end != '\n') {
         SLOG_WARN("Failed to read the record of unproven copies in '%s', all copies are unproven",
                   m_folder.c_str());
@@ -116,12 +94,8 @@ int UnprovenRun::Write() const {
     char text[80];
     const int length = std::snprintf(text, sizeof(text), "%" PRId64 " %" PRId64 " %" PRId64 "\n",
                                      m_from, m_until, m_open);
-    const std::string path = m_folder + RECORD_NAME;
-    const std::string fresh = path + ".new";
-    if (IsWritten(fresh, text, static_cast<size_t>(length)) &&
-        rename(fresh.c_str(), path.c_str()) == 0 && IsFolderSynced(m_folder)) {
-        return 0;
-    }
+    const std::string record(text, static_cast<size_t>(length));
+    if (WriteDurableFile(m_folder + RECORD_NAME, record) == 0) return 0;
     SLOG_ERR("Failed to write the record of unproven copies in '%s': %s", m_folder.c_str(),
              std::strerror(errno));
     return -1;

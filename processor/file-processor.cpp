@@ -17,16 +17,14 @@
 #include "utils/file-op.h"
 #include "utils/log.h"
 
-namespace {
-
-constexpr int kRetrySeconds = 3;
-constexpr int kRedoSeconds = 2;
-
-}  // namespace
-
 FileProcessor::FileProcessor() { pthread_rwlock_init(&m_context_lock, nullptr); }
 
 FileProcessor::~FileProcessor() { pthread_rwlock_destroy(&m_context_lock); }
+
+void FileProcessor::Run() {
+    const LogBatch batch;  // twenty lines for each file
+    WorkerProcessor::Run();
+}
 
 std::string FileProcessor::GetCurrentPath() const {
     const ReadLock lock(m_context_lock);
@@ -64,7 +62,7 @@ int FileProcessor::PrepareEvent() {
     const Event& event = m_context.event;
     TaskRunInfo run_info;
     USBRunInfo usb;
-    if (TaskEntryHandler::GetInstance().GetTaskEntry(event.task_id, run_info) < 0) {
+    if (TaskEntryHandler::GetInstance().GetRunEntry(event.task_id, run_info) < 0) {
         SLOG_NOTICE("task entry (with task %llu) is removed\n", Llu(event.task_id));
         DoneEvent();
         return -1;
@@ -97,8 +95,12 @@ int FileProcessor::Dispatch() {
         case EV_CREATE:
             return HandleCreate();
         default:
-            return HandleCopy();
+            break;
     }
+    const int result = HandleCopy();
+    // The next file is most often of the same folder. What failed may have been the folder itself.
+    if (result == ERR_SUCCESS) PathPlaceScope::KeepForNext();
+    return result;
 }
 
 template <typename Handler>
@@ -160,13 +162,8 @@ int FileProcessor::AddFileLog(int code) {
 }
 
 int FileProcessor::HandleError(int code) {
-    if (!IsErrorCode(code)) {
-        SLOG_CRIT("FileProcessor (%d): unknown error code [%d] -> set errror code [%d].\n", GetID(),
-                  code, ERR_SYSTEM);
-        code = ERR_SYSTEM;
-    }
+    code = NoteOutcome(code);
     const int action = ErrorActionOf(code);
-    SLOG_INFO("FileProcessor (%d): HandleError: %s.\n", GetID(), ErrorText(code));
     Ferrix::ErrorHandler::GetInstance().Set(m_context.event.task_id, code);
 
     // A failure that will be tried again is told when the tries are used up.
@@ -179,25 +176,8 @@ int FileProcessor::HandleError(int code) {
 }
 
 void FileProcessor::HandleAction(int action) {
-    switch (action) {
-        case ERROR_ACTION_DONE:
-            DoneEvent();
-            break;
-        case ERROR_ACTION_RETRY:
-            Wait(kRetrySeconds);
-            break;
-        case ERROR_ACTION_REDO:
-            RedoEvent();
-            Wait(kRedoSeconds);
-            break;
-        case ERROR_ACTION_NONE:
-            break;
-        default:
-            SLOG_WARN("unknown action [%d]\n", action);
-            RedoEvent();
-            Wait(kRedoSeconds);
-            break;
-    }
+    constexpr ActionSeconds kSeconds = {.retry = 3, .redo = 2, .unknown = 2};
+    CarryOut(action, kSeconds);
     SLOG_DBG("FileProcessor (%d): HandleAction (%d)\n", GetID(), action);
 }
 

@@ -23,6 +23,7 @@ public:
     [[nodiscard]] uint64_t GetCurrentTaskId() const override;
 
 protected:
+    void Run() override;
     [[nodiscard]] const char* Name() const override { return "FileProcessor"; }
     [[nodiscard]] int IdleSeconds() const override { return 1; }
     [[nodiscard]] int FailedPrepareSeconds() const override { return 0; }
@@ -31,6 +32,7 @@ protected:
     [[nodiscard]] int Work() override { return Dispatch(); }
     [[nodiscard]] int HandleError(int code) override;
     void HandleAction(int action) override;
+    void DoneEvent() override;
     void RedoEvent() override;
 
 private:
@@ -42,7 +44,6 @@ private:
     int HandleCopy();
     template <typename Handler>
     int Handle(std::unique_ptr<Handler> handler, const char* factory, const char* kind);
-    void DoneEvent();
     void ResetContext();
     int AddFileLog(int code);
 

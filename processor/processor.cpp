@@ -2,6 +2,8 @@
 
 #include <unistd.h>
 
+#include "utils/confined-path.h"
+#include "utils/log.h"
 #include "utils/mutex-lock.h"
 
 namespace {
@@ -89,7 +91,12 @@ int Processor::Wait(int seconds) {
 
 void Processor::SetWaitStepForTest(unsigned microseconds) { s_step_us = microseconds; }
 
-void Processor::SleepOneStep() { usleep(s_step_us.load()); }
+void Processor::SleepOneStep() {
+    // Nothing of what is kept for speed outlasts the work.
+    LogFlush();
+    PathPlaceScope::CloseKept();
+    usleep(s_step_us.load());
+}
 
 void* Processor::Exec(void* processor) {
     auto* const self = static_cast<Processor*>(processor);

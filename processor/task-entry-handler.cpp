@@ -1,51 +1,68 @@
 #include "processor/task-entry-handler.h"
 
+#include <initializer_list>
+#include <utility>
+
+#include "db/task-info.h"
 #include "utils/log.h"
 #include "utils/mutex-lock.h"
 
 namespace {
 
-// One line of a dump: the label behind a tab, the value, and what ends the line.
-void AddField(std::string& out, const char* label, const std::string& value,
-              const char* end = ",\n") {
-    out.append("\t").append(label).append(": ").append(value).append(end);
-}
+// One line of a dump: what stands before the label, the label, the value.
+struct Field {
+    Field(const char* name, const std::string& text, const char* start = "\t")
+        : label(name), value(text), indent(start) {}
+    template <typename Number>
+    Field(const char* name, Number number, const char* start = "\t")
+        : Field(name, std::to_string(number), start) {}
 
-template <typename Number>
-void AddField(std::string& out, const char* label, Number value, const char* end = ",\n") {
-    AddField(out, label, std::to_string(value), end);
+    const char* label;
+    std::string value;
+    const char* indent;
+};
+
+std::string RecordText(std::initializer_list<Field> fields) {
+    std::string out = "{";
+    const char* end_of_line = "\n";
+    for (const Field& field : fields) {
+        out.append(end_of_line).append(field.indent).append(field.label);
+        out.append(": ").append(field.value);
+        end_of_line = ",\n";
+    }
+    return out + "\n}\n";
 }
 
 std::string EntryText(const USBRunInfo& entry) {
-    std::string out = "{\n";
-    AddField(out, "usb_id", entry.usb_id);
-    AddField(out, "usb_share_path", entry.usb_share_path);
-    AddField(out, "uuid", entry.uuid);
-    AddField(out, "run_when_plug_in", entry.run_when_plug_in);
-    AddField(out, "eject_when_task_done", entry.eject_when_task_done, "\n");
-    return out + "}\n";
+    return RecordText({
+        {"usb_id",               entry.usb_id              },
+        {"usb_share_path",       entry.usb_share_path      },
+        {"uuid",                 entry.uuid                },
+        {"run_when_plug_in",     entry.run_when_plug_in    },
+        {"eject_when_task_done", entry.eject_when_task_done},
+    });
 }
 
 std::string EntryText(const TaskRunInfo& entry) {
-    std::string out = "{\n";
-    AddField(out, "task_id", entry.task_id);
-    AddField(out, "usb_id", entry.usb_id);
-    AddField(out, "task_name", entry.task_name);
-    AddField(out, "status", entry.status);
-    AddField(out, "copy_strategy", entry.copy_strategy);
-    AddField(out, "hub_share_name", entry.hub_share_name);
-    AddField(out, "dst_dir_path", entry.dst_dir_path);
-    AddField(out, "src_dir_path", entry.src_dir_path, ",\n\n");
-    AddField(out, "keep_dir_structure", entry.keep_dir_structure);
-    AddField(out, "smart_create_date_dir", entry.smart_create_date_dir);
-    AddField(out, "rename_photo_video", entry.rename_photo_video);
-    AddField(out, "remove_src_file", entry.remove_src_file);
-    AddField(out, "conflict_policy", entry.conflict_policy);
-    AddField(out, "version_dir", entry.version_dir);
-    AddField(out, "enable_rotation", entry.enable_rotation);
-    AddField(out, "max_version_count", entry.max_version_count);
-    AddField(out, "rotation_policy", entry.rotation_policy, "");
-    return out + "\n}\n";
+    return RecordText({
+        {"task_id",            entry.task_id           },
+        {"usb_id",             entry.usb_id            },
+        {"task_name",          entry.task_name         },
+        {"status",             entry.status            },
+        {"copy_strategy",      entry.copy_strategy     },
+        {"hub_share_name",     entry.hub_share_name    },
+        {"dst_dir_path",       entry.dst_dir_path      },
+        {"src_dir_path",       entry.src_dir_path      },
+        {"keep_dir_structure", entry.keep_dir_structure, "\n\t"}, // behind an empty line
+        {"smart_create_date_dir",                    entry.smart_create_date_dir                     },
+        {"rename_photo_video",                    entry.rename_photo_video   },
+        {"remove_src_file",                    entry.remove_src_file                        },
+        {"conflict_policy",                    entry.conflict_policy   },
+        {"version_dir",                    entry.version_dir                            },
+        {"enable_rotation",                    entry.enable_rotation},
+        {"max_version_count",                    entry.max_version_count                          },
+        {"rotation_policy",                    entry.rotation_policy },
+    });
 }
 
 // Copies the entry of this id out of a map. 0, or -1 when there is none.
@@ -120,8 +137,10 @@ void TaskEntryHandler::RemoveUSBEntry(uint64_t usb_id) {
 
 void TaskEntryHandler::RemoveTaskEntry(uint64_t task_id) {
     decltype(m_task_entries)::node_type removed;  // destroyed after the mutex is released
+    decltype(m_run_entries)::node_type run;
     const MutexLock lock(m_mutex);
     removed = m_task_entries.extract(task_id);
+    run = m_run_entries.extract(task_id);
 }
 
 template <typename Change>
@@ -139,7 +158,12 @@ bool TaskEntryHandler::ChangeTask(uint64_t task_id, const Change& change) {
 }
 
 int TaskEntryHandler::SetTaskState(uint64_t task_id, int state) {
-    if (!ChangeTask(task_id, [state](TaskRunInfo& task) { task.status = state; })) return -1;
+    decltype(m_run_entries)::node_type run;  // destroyed after the mutex is released
+    const bool is_set = ChangeTask(task_id, [&](TaskRunInfo& task) {
+        task.status = state;
+        if (state == TASK_RUN_STATE_IDLE) run = m_run_entries.extract(task_id);
+    });
+    if (!is_set) return -1;
     SLOG_DBG("Set task '%llu' state (%d)\n", Llu(task_id), state);
     return 0;
 }
@@ -147,6 +171,37 @@ int TaskEntryHandler::SetTaskState(uint64_t task_id, int state) {
 int TaskEntryHandler::SetTaskVersionDir(uint64_t task_id, const std::string& version_dir) {
     if (!ChangeTask(task_id, [&](TaskRunInfo& task) { task.version_dir = version_dir; })) return -1;
     SLOG_DBG("Set task '%llu' version dir (%s)\n", Llu(task_id), version_dir.c_str());
+    return 0;
+}
+
+int TaskEntryHandler::SetTaskSettings(const TaskRunInfo& entry) {
+    TaskRunInfo replaced = entry;  // what it was the last to hold is destroyed without the mutex
+    const bool is_set = ChangeTask(entry.task_id, [&replaced](TaskRunInfo& task) {
+        replaced.status = task.status;
+        replaced.version_dir = task.version_dir;
+        std::swap(task, replaced);
+    });
+    return is_set ? 0 : -1;
+}
+
+int TaskEntryHandler::StartRun(uint64_t task_id, TaskRunInfo& entry) {
+    TaskRunInfo replaced;  // as in GetTaskEntry
+    TaskRunInfo copy;
+    const MutexLock lock(m_mutex);
+    if (CopyEntry(m_task_entries, task_id, copy) < 0) return -1;
+    replaced = std::exchange(m_run_entries[task_id], copy);
+    std::swap(entry, copy);
+    return 0;
+}
+
+int TaskEntryHandler::GetRunEntry(uint64_t task_id, TaskRunInfo& entry) const {
+    TaskRunInfo copy;  // as in GetTaskEntry
+    const MutexLock lock(m_mutex);
+    const auto task = m_task_entries.find(task_id);
+    if (task == m_task_entries.end()) return -1;
+    if (CopyEntry(m_run_entries, task_id, copy) < 0) copy = task->second;
+    copy.status = task->second.status;
+    std::swap(entry, copy);
     return 0;
 }
 

@@ -46,6 +46,17 @@ public:
     // Change an entry in place. 0, or -1 with a warning when there is no such entry.
     int SetTaskState(uint64_t task_id, int state);
     int SetTaskVersionDir(uint64_t task_id, const std::string& version_dir);
+    // Replaces the entry of the same id, but for what belongs to a run: its state and the version
+    // folder. A worker may have set them since the caller read the entry.
+    int SetTaskSettings(const TaskRunInfo& entry);
+
+    // A run goes by what the task's settings were when it began, on both workers: half of a mirror
+    // in one folder and half in another would be none. StartRun() begins one, or begins it anew,
+    // and gives the entry; GetRunEntry() gives that entry again with the present state, or the
+    // task's own when no run has begun. It ends when the task becomes idle or is removed. 0 or -1
+    // as above.
+    [[nodiscard]] int StartRun(uint64_t task_id, TaskRunInfo& entry);
+    [[nodiscard]] int GetRunEntry(uint64_t task_id, TaskRunInfo& entry) const;
 
     // Empty the list first, then fill it in id order.
     void ListUSBEntries(std::list<USBRunInfo>& entries) const;
@@ -63,4 +74,5 @@ private:
     mutable pthread_mutex_t m_mutex = PTHREAD_MUTEX_INITIALIZER;
     std::map<uint64_t, USBRunInfo> m_usb_entries;
     std::map<uint64_t, TaskRunInfo> m_task_entries;
+    std::map<uint64_t, TaskRunInfo> m_run_entries;  // of tasks whose settings a run goes by
 };

@@ -20,9 +20,6 @@
 namespace {
 
 constexpr char kVersionDirFormat[] = "Ferrix Copy_%F_%H%M%S";
-constexpr int kRetrySeconds = 5;
-constexpr int kRedoSeconds = 3;
-constexpr int kUnknownActionSeconds = 2;
 
 LogDescription::ID LogIdOf(bool is_end, int result) {
     if (!is_end) return LogDescription::LOG_DESC_TASK_STARTED;
@@ -101,7 +98,7 @@ int TaskProcessor::LoadRunInfo() {
         return -1;
     }
     // Anew, with the name of this run's folder.
-    if (TaskEntryHandler::GetInstance().GetTaskEntry(task_id, run_info) < 0) {
+    if (TaskEntryHandler::GetInstance().StartRun(task_id, run_info) < 0) {
         SLOG_NOTICE("Registry Entry (task id: %llu) is removed.\n", Llu(task_id));
         return -1;
     }
@@ -162,12 +159,7 @@ void TaskProcessor::StoreResult(int task_err_code) {
 }
 
 int TaskProcessor::HandleError(int code) {
-    if (!IsErrorCode(code)) {
-        SLOG_CRIT("TaskProcessor (%d): unknown error code [%d] -> set errror code [%d].\n", GetID(),
-                  code, ERR_SYSTEM);
-        code = ERR_SYSTEM;
-    }
-    SLOG_INFO("TaskProcessor (%d): HandleError: %s.\n", GetID(), ErrorText(code));
+    code = NoteOutcome(code);
     Ferrix::ErrorHandler& outcomes = Ferrix::ErrorHandler::GetInstance();
     outcomes.Set(m_task_event.task_id, code);
     const int task_err_code = outcomes.Get(m_task_event.task_id);
@@ -177,26 +169,9 @@ int TaskProcessor::HandleError(int code) {
 }
 
 void TaskProcessor::HandleAction(int action) {
+    constexpr ActionSeconds kSeconds = {.retry = 5, .redo = 3, .unknown = 2};
     const uint64_t task_id = m_task_event.task_id;
-    switch (action) {
-        case ERROR_ACTION_DONE:
-            DoneEvent();
-            break;
-        case ERROR_ACTION_RETRY:
-            Wait(kRetrySeconds);
-            break;
-        case ERROR_ACTION_REDO:
-            RedoEvent();
-            Wait(kRedoSeconds);
-            break;
-        case ERROR_ACTION_NONE:
-            break;
-        default:
-            SLOG_WARN("unknown action [%d]\n", action);
-            RedoEvent();
-            Wait(kUnknownActionSeconds);
-            break;
-    }
+    CarryOut(action, kSeconds);
     SLOG_INFO("TaskProcessor (%d): HandleAction (%d), task id '%llu'\n", GetID(), action,
               Llu(task_id));
 }
@@ -214,14 +189,14 @@ void TaskProcessor::RedoEvent() {
     SLOG_DBG("TaskProcessor (%d): RedoEvent '%llu'\n", GetID(), Llu(task_id));
 }
 
-int TaskProcessor::DoneEvent() {
+// A device that cannot be ejected does not fail the task, whose outcome is stored by now.
+void TaskProcessor::DoneEvent() {
     const uint64_t task_id = m_task_event.task_id;
     const TaskRunInfo run_info = m_task_event.run_info;
     TaskEventManager::GetInstance().DoneEvent(task_id);
     CreateTaskIndex(task_id, run_info);
-    const int result = EjectTaskDevice(task_id, run_info);
+    static_cast<void>(EjectTaskDevice(task_id, run_info));
     LetGo();
     HardwareController::GetInstance().NotifyHWController();
     SLOG_DBG("TaskProcessor (%d): DoneEvent '%llu'\n", GetID(), Llu(task_id));
-    return result;
 }

@@ -27,6 +27,7 @@ protected:
     [[nodiscard]] int Work() override { return RunTask(); }
     [[nodiscard]] int HandleError(int code) override;
     void HandleAction(int action) override;
+    void DoneEvent() override;
     void RedoEvent() override;
 
 private:
@@ -34,7 +35,6 @@ private:
     int LoadRunInfo();
     int SetVersionDir();
     int RunTask();
-    int DoneEvent();
     void LetGo();
 
     void StoreResult(int task_err_code);

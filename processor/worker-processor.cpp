@@ -3,6 +3,7 @@
 #include <sched.h>
 
 #include "processor/barrier.h"
+#include "utils/confined-path.h"
 #include "utils/error-code.h"
 #include "utils/log.h"
 #include "utils/mutex-lock.h"
@@ -80,6 +81,39 @@ WorkerProcessor::Taken WorkerProcessor::TakeWork() {
 void WorkerProcessor::ReachBarrier() {
     Barrier* const barrier = m_barrier.Take();
     if (barrier == nullptr) return;
+    PathPlaceScope::CloseKept();  // whoever waits here may be about to unmount the device
     if (GetCurrentTaskId() != 0) RedoEvent();
     barrier->Reach(GetID());
+}
+
+int WorkerProcessor::NoteOutcome(int code) const {
+    if (!IsErrorCode(code)) {
+        SLOG_CRIT("%s (%d): unknown error code [%d] -> set errror code [%d].\n", Name(), GetID(),
+                  code, ERR_SYSTEM);
+        code = ERR_SYSTEM;
+    }
+    SLOG_INFO("%s (%d): HandleError: %s.\n", Name(), GetID(), ErrorText(code));
+    return code;
+}
+
+void WorkerProcessor::CarryOut(int action, const ActionSeconds& seconds) {
+    switch (action) {
+        case ERROR_ACTION_DONE:
+            DoneEvent();
+            break;
+        case ERROR_ACTION_RETRY:
+            Wait(seconds.retry);
+            break;
+        case ERROR_ACTION_REDO:
+            RedoEvent();
+            Wait(seconds.redo);
+            break;
+        case ERROR_ACTION_NONE:
+            break;
+        default:
+            SLOG_WARN("unknown action [%d]\n", action);
+            RedoEvent();
+            Wait(seconds.unknown);
+            break;
+    }
 }

@@ -61,8 +61,20 @@ protected:
     // Records the outcome; the ErrorAction that follows.
     [[nodiscard]] virtual int HandleError(int code) = 0;
     virtual void HandleAction(int action) = 0;
+    // Ends the work in hand.
+    virtual void DoneEvent() = 0;
     // Gives the work in hand back, to be done later.
     virtual void RedoEvent() = 0;
+
+    // For HandleError: logs the outcome; a code that is none becomes "System error".
+    [[nodiscard]] int NoteOutcome(int code) const;
+    // For HandleAction: how long a worker waits after each action, and the actions themselves.
+    struct ActionSeconds {
+        int retry;
+        int redo;
+        int unknown;
+    };
+    void CarryOut(int action, const ActionSeconds& seconds);
 
     // The two halves of a pass of the loop, while running: what is done at its head, and the work.
     void ReachBarrier();

@@ -7,8 +7,10 @@
 #include "strategy/file-event-context.h"
 #include "strategy/recycle-bin.h"
 #include "strategy/root-check.h"
+#include "utils/confined-path.h"
 #include "utils/error-code.h"
 #include "utils/file-op.h"
+#include "utils/file-proof.h"
 #include "utils/log.h"
 
 int CopyHandler::Handle() {
@@ -30,6 +32,8 @@ int CopyHandler::SetCopyToFullPath() {
 }
 
 int CopyHandler::UpdateDB() { return ERR_SUCCESS; }
+
+int CopyHandler::NoteMove() { return ERR_SUCCESS; }
 
 int CopyHandler::RunSteps() {
     if (const int result = StatSource(); result < 0) return result;
@@ -157,6 +161,7 @@ int CopyHandler::HandleDstExists() {
     }
     if (info.size == m_src_info.size && info.mtime == m_src_info.mtime) {
         SLOG_INFO("File can be merged '%s', ignore.", m_copy_to_full_path.c_str());
+        m_is_merged = true;
         return ERR_SUCCESS;
     }
     return RenameConflict(m_copy_to_full_path, "Conflict", ERR_DST_EXISTS);
@@ -182,14 +187,60 @@ int CopyHandler::Finish() {
         SLOG_WARN("Failed to change file atime and mtime '%s' for task '%llu', ignore",
                   m_copy_to_full_path.c_str(), Llu(Task().task_id));
     }
-    if (IsSourceRemoved()) {
-        if (RecycleBin().RemoveFile(m_copy_from_full_path, false) == 0) return ERR_SUCCESS;
-        SLOG_ERR("Failed to remove file '%s'", m_copy_from_full_path.c_str());
-        return ERR_FILE_OPERATION;
-    }
+    if (IsSourceRemoved()) return MoveSource();
     if (const int result = UpdateDB(); result < 0) {
         SLOG_ERR("Failed to update db for event '%s' [ret = %d]", EventPath().c_str(), result);
         return result;
     }
     return ERR_SUCCESS;
+}
+
+// The source may be the only copy that there is: it goes last.
+int CopyHandler::MoveSource() {
+    if (const int result = ProveCopy(); result < 0) return result;
+    if (const int result = NoteMove(); result < 0) return result;
+    if (const int result = CheckTaskRoots(Task()); result < 0) return result;
+    if (RecycleBin().RemoveFile(m_copy_from_full_path, false) == 0) return ERR_SUCCESS;
+    SLOG_ERR("Failed to remove file '%s'", m_copy_from_full_path.c_str());
+    return ERR_FILE_OPERATION;
+}
+
+int CopyHandler::ProveCopy() {
+    const std::string& root = Task().dst_root ? Task().dst_root->Path() : Task().dst_dir_path;
+    if (FSFlushFile(m_copy_to_full_path, root) < 0) {
+        DiscardCopy();
+        return ERR_IO;
+    }
+    switch (FSCompareOnMedium(m_copy_from_full_path, m_copy_to_full_path, AbortFlag())) {
+        case FS_COMPARE_EQUAL:
+            return ERR_SUCCESS;
+        case FS_COMPARE_ABORTED:
+            return ERR_INTERRUPTED;
+        case FS_COMPARE_SOURCE_FAILED:
+            return ERR_IO;
+        case FS_COMPARE_COPY_FAILED:
+            DiscardCopy();
+            return ERR_IO;
+        case FS_COMPARE_DIFFERENT:
+            break;
+    }
+    return HandleDifference();
+}
+
+int CopyHandler::HandleDifference() {
+    // Another file, that only looked the same: both have to live.
+    if (m_is_merged) return RenameConflict(m_copy_to_full_path, "Conflict", ERR_DST_EXISTS);
+    DiscardCopy();
+    return ERR_IO;
+}
+
+// A copy that did not reach the disk whole must not stand there as one; and a second flush of it
+// would not tell. The next attempt makes a new one.
+void CopyHandler::DiscardCopy() const {
+    SLOG_ERR("Copy '%s' is not proven, source file '%s' stays", m_copy_to_full_path.c_str(),
+             m_copy_from_full_path.c_str());
+    if (m_is_merged) return;
+    if (FSRemove(m_copy_to_full_path) < 0) {
+        SLOG_ERR("Failed to remove '%s'.", m_copy_to_full_path.c_str());
+    }
 }

@@ -24,6 +24,8 @@ protected:
     [[nodiscard]] virtual int SetCopyToFullPath();
     // Records the copy; the base keeps no record.
     [[nodiscard]] virtual int UpdateDB();
+    // Notes a copy whose source is about to be removed; the base keeps no note.
+    [[nodiscard]] virtual int NoteMove();
 
     std::string m_copy_to_full_path;
     std::string m_copy_from_full_path;
@@ -41,4 +43,11 @@ private:
     [[nodiscard]] int HandleDstExists();
     [[nodiscard]] int HandleDstTypeConflict();
     [[nodiscard]] int Finish();
+    // Removes the source, once the copy is known to be on the disk and to equal it.
+    [[nodiscard]] int MoveSource();
+    [[nodiscard]] int ProveCopy();
+    [[nodiscard]] int HandleDifference();
+    void DiscardCopy() const;
+
+    bool m_is_merged = false;  // what stands at the destination was there before
 };

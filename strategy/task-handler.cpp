@@ -5,14 +5,18 @@
 #include <ctime>
 #include <string>
 
+#include "db/task-info.h"
 #include "event/event-generator.h"
 #include "event/event-manager.h"
 #include "platform/error-handler.h"
 #include "platform/unproven-run.h"
 #include "processor/processor.h"
 #include "processor/task-mounts.h"
+#include "strategy/record-proof.h"
 #include "strategy/root-check.h"
+#include "strategy/rotation-handler.h"
 #include "strategy/task-run-info.h"
+#include "strategy/version-end.h"
 #include "utils/confined-path.h"
 #include "utils/error-code.h"
 #include "utils/file-op.h"
@@ -48,7 +52,10 @@ bool IsDestinationThere(int roots) { return roots == ERR_SUCCESS || roots == ERR
 // under way, so that the record stays, from the start of the flush on.
 void KeepInterruptedRun(const TaskRunInfo& task) {
     const int64_t flush_start = time(nullptr);
-    if (!IsFlushed(task) || !IsDestinationThere(CheckTaskRoots(task))) return;
+    RecordProof records(task);
+    const bool is_on_disk = IsFlushed(task) && IsDestinationThere(CheckTaskRoots(task));
+    records.Settle(is_on_disk);
+    if (TakeFlushFailure(task) || !is_on_disk) return;
     if (UnprovenRun(task.task_id).KeepSince(flush_start) < 0) {
         SLOG_WARN("Copies of task '%llu' will be made again", Llu(task.task_id));
     }
@@ -57,15 +64,24 @@ void KeepInterruptedRun(const TaskRunInfo& task) {
 // All events are done. The run is good only when its copies are on the disk, and came from a device
 // that was there to the end: one that is gone lists as an empty folder.
 int FinishRun(const TaskRunInfo& task) {
+    RecordProof records(task);
     const bool is_flushed = IsFlushed(task);
     const int roots = CheckTaskRoots(task);
-    if (!is_flushed) return roots < 0 ? roots : ERR_IO;
+    records.Settle(is_flushed && IsDestinationThere(roots));
+    if (TakeFlushFailure(task) || !is_flushed) return roots < 0 ? roots : ERR_IO;
     if (!IsDestinationThere(roots)) return roots;
     const int outcome = Ferrix::ErrorHandler::GetInstance().Get(task.task_id);
-    if (UnprovenRun(task.task_id).End(roots == ERR_SUCCESS && outcome == ERR_SUCCESS) < 0) {
+    const bool is_all_copied = roots == ERR_SUCCESS && outcome == ERR_SUCCESS;
+    if (is_all_copied) EndRecords(task);
+    if (UnprovenRun(task.task_id).End(is_all_copied) < 0) {
         SLOG_WARN("Copies of task '%llu' will be made again", Llu(task.task_id));
     }
     return roots;
+}
+
+bool IsRootMiss(int outcome) {
+    return outcome == ERR_SRC_ROOT_MISS || outcome == ERR_DST_ROOT_MISS ||
+           outcome == ERR_SHARE_NOT_MOUNTED;
 }
 
 }  // namespace
@@ -123,10 +139,34 @@ int TaskHandler::DoHandle() {
 
 int TaskHandler::PostHandle() {
     const TaskRunInfo task = *m_task;
-    const int result = WaitForFileProcessors();
-    if (result >= 0) return FinishRun(task);
-    SLOG_ERR("TaskHandler: interrupted while waiting events being done ...");
-    KeepInterruptedRun(task);
+    RotationHandler rotation;
+    int result = WaitForFileProcessors();
+    if (result >= 0) {
+        result = FinishRun(task);
+    } else {
+        SLOG_ERR("TaskHandler: interrupted while waiting events being done ...");
+        KeepInterruptedRun(task);
+    }
+    if (task.copy_strategy != COPY_STRATEGY_VERSION) return result;
+    return EndVersion(task, result, rotation);
+}
+
+int TaskHandler::EndVersion(const TaskRunInfo& task, int result, RotationHandler& rotation) const {
+    // A device that was gone in the middle and is back has left gaps.
+    const int outcome = Ferrix::ErrorHandler::GetInstance().Get(task.task_id);
+    if (result >= 0 && IsRootMiss(outcome)) result = outcome;
+    if (result < 0) {
+        EndBadVersion(task);
+        return result;
+    }
+    EndGoodVersion(task);
+    if (!task.enable_rotation) return ERR_SUCCESS;
+    rotation.Init(task);
+    rotation.SetAbortFlag(m_abort_flag);
+    result = rotation.Run();
+    if (result < 0) {
+        SLOG_ERR("TaskHandler: Failed to handle rotation for task '%llu'", Llu(task.task_id));
+    }
     return result;
 }
 

@@ -8,6 +8,7 @@
 #include <atomic>
 
 class Processor;
+class RotationHandler;
 struct TaskRunInfo;
 
 class TaskHandler {
@@ -40,6 +41,9 @@ protected:
     [[nodiscard]] int WaitForFileProcessors();
 
 private:
+    // What becomes of the folder of a version run, and the rotation after a good one.
+    [[nodiscard]] int EndVersion(const TaskRunInfo& task, int result,
+                                 RotationHandler& rotation) const;
     [[nodiscard]] bool IsAborted() const;
     // Ends within a tenth of a second when the worker is stopped or the run aborted.
     void SleepOneSecond() const;

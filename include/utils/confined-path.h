@@ -44,6 +44,8 @@ private:
 // For tests: false takes the way of kernels before 5.6, one component at a time.
 void ConfinedPathUseOpenat2(bool is_used);
 
+constexpr int PLACE_KEEP_MS = 50;
+
 // While one lives, its thread opens each folder that a PathPlace needs only once: the calls for one
 // file go to the same two folders again and again. The folders stay open until the outermost scope
 // of the thread ends, so a scope is as short as the work on one file: an open folder holds a device
@@ -54,6 +56,13 @@ public:
     ~PathPlaceScope();
     PathPlaceScope(const PathPlaceScope&) = delete;
     PathPlaceScope& operator=(const PathPlaceScope&) = delete;
+
+    // The folders stay open after this scope, for the next one of the thread: for work that goes on
+    // in the same folders and has not moved or removed any. A scope that begins PLACE_KEEP_MS after
+    // the first was opened begins with none all the same.
+    static void KeepForNext();
+    // Closes what was kept for the next scope. To be called before the thread waits.
+    static void CloseKept();
 };
 
 // Where a file system call on `path` has to be made: the open folder that holds the last component,

@@ -2,7 +2,7 @@
 //
 // Threads: every operation may be called from any thread. A line is built once, in a buffer on the
 // caller's stack, and sent as one datagram over a connection that stays open. A log daemon that
-// hangs holds a caller up for at most LOG_STALL_MS; further lines are dropped until it takes lines
+// hangs holds callers up for at most LOG_STALL_MS; further lines are dropped until it takes lines
 // again, and a line then tells how many were lost.
 // Texts may hold any bytes; a name is always an argument, never the format.
 #pragma once
@@ -23,6 +23,21 @@ void LogClose();
 // Takes every line instead of syslog, without the syslog header; nullptr gives them back to syslog.
 using LogSink = void (*)(int priority, std::string_view line);
 void LogSetSink(LogSink sink);
+
+// While one lives, lines of its thread may be kept back a little and go out together, which costs
+// half. All threads' lines keep one order. What is kept goes out when the last batch of the thread
+// ends, when it is 64 lines, before a warning or worse, before a line of a thread without a batch,
+// and on a crash; so a SIGKILL takes no more than that away.
+class LogBatch {
+public:
+    LogBatch();
+    ~LogBatch();
+    LogBatch(const LogBatch&) = delete;
+    LogBatch& operator=(const LogBatch&) = delete;
+};
+
+// Sends what is kept back. For a thread with a batch: before it sleeps.
+void LogFlush();
 
 // Use the macros below.
 void LogWrite(int priority, const char* format, ...) __attribute__((format(printf, 2, 3)));

@@ -6,6 +6,8 @@
 
 // `path` with a "/" at its end; "/" for an empty path.
 [[nodiscard]] std::string PathAddTrailingSlash(std::string_view path);
+// `path` without any "/" at its end; empty for a path of slashes alone.
+[[nodiscard]] std::string PathWithoutTrailingSlashes(std::string_view path);
 // What stands before the last "/"; "." without one, "/" when the only one is the first character.
 [[nodiscard]] std::string PathDirName(std::string_view path);
 // What stands after the last "/", or the whole path.

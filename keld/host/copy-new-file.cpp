@@ -43,8 +43,8 @@ NewFile::~NewFile() {
     GiveBackCopyTempName(m_temp_name, is_file_left);
 }
 
-int NewFile::Create() {
-    m_file.Reset(openat(m_dir_fd, ".", O_TMPFILE | O_WRONLY | O_CLOEXEC, PRIVATE_MODE));
+int NewFile::Create(mode_t mode) {
+    m_file.Reset(openat(m_dir_fd, ".", O_TMPFILE | O_WRONLY | O_CLOEXEC, mode));
     if (m_file.IsValid()) return KELDERR_SUCCESS;
     if (!MeansNoUnnamedFiles(errno)) return CopyDestinationError(errno);
     return CreateNamed();

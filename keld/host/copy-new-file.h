@@ -1,6 +1,8 @@
 // A file that is written beside its final place and put there in one step.
 #pragma once
 
+#include <sys/types.h>
+
 #include <string>
 
 #include "utils/unique-fd.h"
@@ -17,8 +19,10 @@ public:
     NewFile(const NewFile&) = delete;
     NewFile& operator=(const NewFile&) = delete;
 
-    // Makes the file, with mode 0600, open for writing. Returns 0 or a KELDERR value.
-    [[nodiscard]] int Create();
+    // Makes the file, open for writing: with `mode` if it is unnamed, so that nobody else can open
+    // it yet, else with 0600. The umask and the folder's defaults apply. Returns 0 or a KELDERR
+    // value.
+    [[nodiscard]] int Create(mode_t mode);
     [[nodiscard]] int Fd() const { return m_file.Get(); }
     // Gives it the name `name` in the folder and closes it. An existing regular file is replaced if
     // `may_replace`, else the answer is KELDERR_DST_EXISTS; anything else there is

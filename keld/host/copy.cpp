@@ -28,6 +28,7 @@ namespace keld_host {
 namespace {
 
 constexpr mode_t PERMISSION_BITS = 0777;
+constexpr mode_t ALL_MODE_BITS = 07777;
 // Not blocked by a FIFO that took the file's place; no terminal becomes the daemon's.
 constexpr int SOURCE_FLAGS = O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
 
@@ -56,19 +57,7 @@ private:
 UniqueFd OpenSource(const std::string& path) {
     thread_local RootMemory memory;
     const auto root = memory.RootOf(path);
-    if (!root) {
-        const PathPlace place(path);
-        if (!place.IsReached()) {
-            errno = place.Error();
-            return {};
-        }
-        return UniqueFd(openat(place.DirFd(), place.Name(), SOURCE_FLAGS));
-    }
-    const UniqueFd base(open(root->c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
-    if (!base.IsValid()) return {};
-    std::string_view relative = std::string_view(path).substr(root->size());
-    while (relative.starts_with('/')) relative.remove_prefix(1);
-    return OpenBeneath(base.Get(), relative, SOURCE_FLAGS);
+    return (root ? PathPlace(*root, path) : PathPlace(path)).Open(SOURCE_FLAGS);
 }
 
 int StatSource(int fd, struct stat* source) {
@@ -96,9 +85,10 @@ int SetOwnerAndMode(int fd, mode_t mode, const KELDCopyOptions& options) {
     const auto owner = static_cast<uid_t>(options.owner);
     const auto group = static_cast<gid_t>(options.group);
     if (fchown(fd, owner, group) != 0 && !MayBeIgnored(errno)) return CopyDestinationError(errno);
-    if (fchmod(fd, mode & PERMISSION_BITS) != 0 && !MayBeIgnored(errno)) {
-        return CopyDestinationError(errno);
-    }
+    // Most often the file was made with the mode: a look costs a tenth of setting it once more.
+    struct stat made {};
+    if (fstat(fd, &made) == 0 && (made.st_mode & ALL_MODE_BITS) == mode) return KELDERR_SUCCESS;
+    if (fchmod(fd, mode) != 0 && !MayBeIgnored(errno)) return CopyDestinationError(errno);
     return KELDERR_SUCCESS;
 }
 
@@ -108,9 +98,9 @@ int CopyInto(int dir_fd, const char* name, int from, const struct stat& source,
     const int found = LookAtDestination(dir_fd, name);
     if (found != KELDERR_SUCCESS && !(found == KELDERR_DST_EXISTS && may_replace)) return found;
     NewFile file(dir_fd);
-    if (const int code = file.Create(); code != KELDERR_SUCCESS) return code;
-    if (const int code = SetOwnerAndMode(file.Fd(), source.st_mode, options);
-        code != KELDERR_SUCCESS) {
+    const mode_t mode = source.st_mode & PERMISSION_BITS;
+    if (const int code = file.Create(mode); code != KELDERR_SUCCESS) return code;
+    if (const int code = SetOwnerAndMode(file.Fd(), mode, options); code != KELDERR_SUCCESS) {
         return code;
     }
     if (const int code = CopyData(from, file.Fd(), source, cancel); code != KELDERR_SUCCESS) {

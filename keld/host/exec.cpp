@@ -1,9 +1,12 @@
 // Running single programs, and pid files.
 #include <keld/exec.h>
 
+#include <algorithm>
 #include <cerrno>
+#include <climits>
 #include <cstdarg>
 #include <cstdlib>
+#include <iterator>
 #include <string>
 
 #include "host/host-error.h"
@@ -22,6 +25,17 @@ namespace {
 // do.
 constexpr const char* RDX_SCRIPT = "/lib/udev/script/rdx_util.sh";
 
+// What moves a repository to another volume, which takes as long as it takes. No daemon waits for
+// these: they are run by control programs, while it is stopped.
+constexpr const char* UNLIMITED_PROGRAMS[] = {"/bin/cp", "/bin/mv"};
+
+int LimitOf(const std::string& program) {
+    const bool is_unlimited =
+        std::find(std::begin(UNLIMITED_PROGRAMS), std::end(UNLIMITED_PROGRAMS), program) !=
+        std::end(UNLIMITED_PROGRAMS);
+    return is_unlimited ? INT_MAX : keld_host::RUN_LIMIT_MS;
+}
+
 // Reads the arguments up to the null pointer. The caller has started and ends the list.
 Program ReadArguments(const char* path, va_list list) {
     Program program;
@@ -39,7 +53,7 @@ int KLIBCExec(const char* program, ...) {
     va_start(list, program);
     const Program prepared = ReadArguments(program, list);
     va_end(list);
-    const int result = keld_host::RunProgram(prepared);
+    const int result = keld_host::RunProgram(prepared, LimitOf(prepared.path));
     if (result >= 0) return result;
     if (errno == ENOENT && prepared.path == RDX_SCRIPT) return 0;
     return FailErrno(errno);

@@ -28,10 +28,17 @@ protected:
 };
 
 TEST_F(MessageTest, TheTablesHoldWhatThisDaemonCanDo) {
-    EXPECT_THAT(FerrixdPeer::Actions(m_app),
-                ElementsAre("add_task", "get_filter_setting", "link", "list_entry", "list_task",
-                            "remove_task", "set_filter_setting", "stop"));
-    EXPECT_THAT(FerrixdPeer::Hooks(m_app), ElementsAre("post_mount", "pre_unmount"));
+    EXPECT_THAT(
+        FerrixdPeer::Actions(m_app),
+        ElementsAre("add_task", "cancel_task", "disable_task", "enable_task", "get_filter_setting",
+                    "get_task_setting", "link", "list_entry", "list_task", "remove_task",
+                    "run_task", "set_filter_setting", "set_global_setting", "set_task_setting",
+                    "set_trigger_time_setting", "stop"));
+    EXPECT_THAT(
+        FerrixdPeer::Hooks(m_app),
+        ElementsAre("post_decrypt", "post_ferrix", "post_mount", "post_path_change",
+                    "post_snapshot_restore", "post_transform", "pre_delete", "pre_encrypt",
+                    "pre_path_change", "pre_snapshot_restore", "pre_transform", "pre_unmount"));
 }
 
 TEST_F(MessageTest, TheRequestAndTheResponseAreLogged) {
@@ -62,6 +69,16 @@ TEST_F(MessageTest, EachOfTheThreeTypesReachesAHook) {
         Handle(Hook("post_mount", type));
         EXPECT_EQ(1, m_log.Count(kMountRan)) << type;
         EXPECT_TRUE(m_log.Has("[DBG] <<< null"));
+    }
+}
+
+TEST_F(MessageTest, SeveralHooksShareAHandlerAndTheTypeDoesNotMatter) {
+    for (const PObject& request :
+         {Hook("pre_transform", "share_hook"), Hook("pre_path_change", "volume_hook"),
+          Hook("pre_snapshot_restore", "ferrix_hook")}) {
+        m_log.Clear();
+        Handle(request);
+        EXPECT_TRUE(m_log.Has("[ERR] HandleShareRemoveEntry: Invalid parameter"));
     }
 }
 

@@ -83,6 +83,10 @@ int CommandTest::Notify(const std::string& hook, const std::string& mount_path,
     PObject request;
     request["mountpoint"] = mount_path;
     request["device"] = device_path;
+    return Notify(hook, request);
+}
+
+int CommandTest::Notify(const std::string& hook, const PObject& request) {
     return FerrixdPeer::Notify(m_app, hook, request);
 }
 
@@ -113,6 +117,8 @@ std::string CommandTest::PlugIn(const std::string& name, const std::string& uuid
 int CommandTest::PostMount(const std::string& name) {
     return Notify("post_mount", MountPath(name), DevicePath(name));
 }
+
+int CommandTest::PressButton() { return FerrixdPeer::Notify(m_app, "post_ferrix", PObject()); }
 
 int CommandTest::PreUnmount(const std::string& name) {
     return Notify("pre_unmount", MountPath(name), DevicePath(name));
@@ -195,6 +201,15 @@ PObject CommandTest::ForTask(uint64_t task_id) {
     return request;
 }
 
+PObject CommandTest::ImportSetting(uint64_t task_id, const std::map<std::string, PObject>& keys) {
+    PObject request = ForTask(task_id);
+    request["task_type"] = static_cast<int>(TASK_TYPE_IMPORT_GENERAL);
+    request["hub_share_name"] = "photos";
+    request["hub_folder_path"] = "/";
+    for (const auto& [key, value] : keys) request[key] = value;
+    return request;
+}
+
 PObject CommandTest::List(const std::vector<std::string>& texts) {
     PObject list;
     list = PObject::empty_array;
@@ -241,6 +256,16 @@ uint64_t CommandTest::LogRows(int description_id) {
     uint64_t count = 0;
     EXPECT_EQ(0, LogDB::GetInstance().CountLogInfo(filter, count));
     return count;
+}
+
+std::vector<std::string> CommandTest::LogTexts(int description_id) {
+    LogFilter filter;
+    filter.description_ids = {description_id};
+    std::vector<LogInfo> rows;
+    EXPECT_EQ(0, LogDB::GetInstance().ListLogInfo(filter, rows));
+    std::vector<std::string> texts;
+    for (const LogInfo& row : rows) texts.push_back(row.description_param);
+    return texts;
 }
 
 void CommandTest::Execute(const std::string& table, const std::string& sql) {

@@ -6,6 +6,7 @@
 #include <gtest/gtest.h>
 
 #include <list>
+#include <map>
 #include <string>
 #include <vector>
 
@@ -29,6 +30,7 @@ protected:
     PObject Send(const std::string& action, PObject request = PObject());
     int Notify(const std::string& hook, const std::string& mount_path,
                const std::string& device_path);
+    int Notify(const std::string& hook, const PObject& request);
 
     // --- The box
     // Makes the share's folder on the volume, and the share.
@@ -40,6 +42,8 @@ protected:
     [[nodiscard]] std::string DevicePath(const std::string& name) const;
     // Posts the hook of a device that PlugIn() made.
     int PostMount(const std::string& name);
+    // The copy button.
+    int PressButton();
     int PreUnmount(const std::string& name);
     // Loads what is mounted, as "link" does; and forgets all entries, as "stop" does.
     int LoadEntries();
@@ -55,6 +59,9 @@ protected:
     // Sends it; the id of the new task, 0 on failure.
     uint64_t AddTask(const std::string& device, const std::string& uuid);
     [[nodiscard]] static PObject ForTask(uint64_t task_id);
+    // A setting of an import, with the three keys that each has to send: for the root of "photos".
+    [[nodiscard]] static PObject ImportSetting(uint64_t task_id,
+                                               const std::map<std::string, PObject>& keys);
     [[nodiscard]] static PObject List(const std::vector<std::string>& texts);
     [[nodiscard]] std::string TaskFolder(uint64_t task_id) const;
     [[nodiscard]] static std::list<TaskInfo> Tasks();
@@ -64,6 +71,8 @@ protected:
     [[nodiscard]] static TaskRunInfo Entry(uint64_t task_id);
     // The number of log rows of a description.
     [[nodiscard]] static uint64_t LogRows(int description_id);
+    // Their parameters, newest first.
+    [[nodiscard]] static std::vector<std::string> LogTexts(int description_id);
     // Makes every INSERT, UPDATE or DELETE of rows of a table fail; it stays readable.
     void BreakTable(const std::string& table, const std::string& what);
     // Makes every access to a table fail.

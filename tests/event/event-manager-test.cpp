@@ -229,4 +229,19 @@ TEST_F(EventGeneratorTest, BuildsTheFourKindsOfEvents) {
     }
 }
 
+TEST_F(EventManagerTest, EventsInHandAreCountedByTask) {
+    m_manager.PushEvent(Copy(7, "/a"));
+    m_manager.PushEvent(Copy(8, "/b"));
+    EXPECT_EQ(0U, m_manager.GetHeldEventCount(7));
+    EXPECT_EQ("7/a", Pull(m_worker));
+    const Event first = m_event;
+    EXPECT_EQ("8/b", Pull(m_other_worker));
+    EXPECT_EQ(1U, m_manager.GetHeldEventCount(7));
+    EXPECT_EQ(1U, m_manager.GetHeldEventCount(8));
+    EXPECT_EQ(0, m_manager.RedoEvent(&m_worker, first));
+    EXPECT_EQ(0, m_manager.DoneEvent(&m_other_worker));
+    EXPECT_EQ(0U, m_manager.GetHeldEventCount(7));
+    EXPECT_EQ(0U, m_manager.GetHeldEventCount(8));
+}
+
 }  // namespace

@@ -81,6 +81,15 @@ void FakeKeld::Pull(const std::string& mount_path) {
     LockedState()->devices[mount_path].present = false;
 }
 
+void FakeKeld::AddVolume(FakeVolume volume) { LockedState()->volumes.push_back(std::move(volume)); }
+
+void FakeKeld::RemoveVolume(const std::string& mount_path) {
+    std::erase_if(LockedState()->volumes,
+                  [&](const FakeVolume& volume) { return volume.mount_path == mount_path; });
+}
+
+void FakeKeld::RunProgramsForReal() { LockedState()->programs_are_real = true; }
+
 void FakeKeld::SetCapability(const std::string& key, bool has) {
     LockedState()->capabilities[key] = has;
 }

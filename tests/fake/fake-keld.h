@@ -50,6 +50,14 @@ struct FakeDevice {
     bool recycle_bin = false;
 };
 
+// A volume of the box. The shares' volumes need not be named.
+struct FakeVolume {
+    std::string mount_path{};
+    bool mounted = true;
+    bool writable = true;
+    bool internal = true;
+};
+
 struct FakeUser {
     std::string name{};
     unsigned uid = 0;
@@ -122,6 +130,10 @@ public:
     void Unmount(const std::string& mount_path);  // orderly: no share and no volume any more
     void Pull(const std::string& mount_path);     // gone, but still listed as mounted
 
+    // --- Volumes of the box, in the order in which they are added
+    void AddVolume(FakeVolume volume);
+    void RemoveVolume(const std::string& mount_path);
+
     // --- The box
     void SetCapability(const std::string& key, bool has = true);
     void SetHostname(const std::string& name);
@@ -133,6 +145,9 @@ public:
     void AddGroup(const std::string& name, unsigned gid, std::vector<std::string> members);
     // What a program gives back when it is run; 0 for one that is not named.
     void SetProgramResult(const std::string& program, int result);
+
+    // From now on programs are run, not only noted: those that need no environment of their own.
+    void RunProgramsForReal();
 
     // --- What was done
     [[nodiscard]] std::vector<FakeNotification> Notifications() const;

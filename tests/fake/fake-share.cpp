@@ -45,17 +45,21 @@ int Status(const char* call, const KELDShare* share, int* status,
     return 0;
 }
 
-KELDMountVolInfo* NewVolume(const FakeDevice& device) {
+KELDMountVolInfo* NewVolume(const FakeVolume& known, const std::string& device_path) {
     auto volume = std::make_unique<OwnedVolume>();
-    volume->mount_text = device.mount_path;
-    volume->device_text = device.dev_path;
+    volume->mount_text = known.mount_path;
+    volume->device_text = device_path;
     volume->mount_path = volume->mount_text.c_str();
     volume->device_path = volume->device_text.c_str();
-    volume->is_mounted = 1;
-    volume->is_writable = 1;
-    volume->is_internal = 0;
+    volume->is_mounted = known.mounted ? 1 : 0;
+    volume->is_writable = known.writable ? 1 : 0;
+    volume->is_internal = known.internal ? 1 : 0;
     volume->next = nullptr;
     return volume.release();
+}
+
+KELDMountVolInfo* NewVolume(const FakeDevice& device) {
+    return NewVolume({.mount_path = device.mount_path, .internal = false}, device.dev_path);
 }
 
 // The file system that holds a path: a device's, or the volume of a share.
@@ -182,14 +186,21 @@ KELDMountVolInfo* KELDMountVolAllEnum(int reserved, int kinds) {
     if (FakeFails("KELDMountVolAllEnum", {std::to_string(reserved), std::to_string(kinds)})) {
         return nullptr;
     }
-    if (kinds != 0 && (kinds & KELD_MOUNT_VOL_REMOVABLE) == 0) return nullptr;
+    if (kinds == 0) kinds = KELD_MOUNT_VOL_INTERNAL | KELD_MOUNT_VOL_REMOVABLE;
     KELDMountVolInfo* first = nullptr;
+    KELDMountVolInfo** end = &first;
+    const auto append = [&](KELDMountVolInfo* volume) {
+        *end = volume;
+        end = &volume->next;
+    };
     const LockedState state;
-    for (auto it = state->devices.rbegin(); it != state->devices.rend(); ++it) {
-        if (!it->second.mounted) continue;
-        KELDMountVolInfo* volume = NewVolume(it->second);
-        volume->next = first;
-        first = volume;
+    for (const FakeVolume& volume : state->volumes) {
+        const int kind = volume.internal ? KELD_MOUNT_VOL_INTERNAL : KELD_MOUNT_VOL_REMOVABLE;
+        if ((kinds & kind) != 0) append(NewVolume(volume, "/dev/fake-volume"));
+    }
+    for (const auto& [path, device] : state->devices) {
+        const bool is_asked = (kinds & KELD_MOUNT_VOL_REMOVABLE) != 0;
+        if (is_asked && device.mounted) append(NewVolume(device));
     }
     return first;
 }
@@ -197,6 +208,9 @@ KELDMountVolInfo* KELDMountVolAllEnum(int reserved, int kinds) {
 KELDMountVolInfo* KELDMountVolInfoGet(const char* path) {
     if (FakeFails("KELDMountVolInfoGet", {FakeText(path)})) return nullptr;
     const LockedState state;
+    for (const FakeVolume& volume : state->volumes) {
+        if (volume.mount_path == FakeText(path)) return NewVolume(volume, "/dev/fake-volume");
+    }
     const auto found = state->devices.find(FakeText(path));
     if (found == state->devices.end() || !found->second.mounted) return nullptr;
     return NewVolume(found->second);

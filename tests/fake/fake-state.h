@@ -29,6 +29,7 @@ struct FakeState {
 
     std::map<std::string, FakeShare> shares;
     std::map<std::string, FakeDevice> devices;
+    std::vector<FakeVolume> volumes;
 
     std::map<std::string, bool> capabilities;
     std::string hostname = "fakebox";
@@ -39,6 +40,7 @@ struct FakeState {
     std::vector<FakeUser> users;
     std::map<std::string, FakeGroup> groups;
     std::map<std::string, int> program_results;
+    bool programs_are_real = false;
 
     std::vector<FakeNotification> notifications;
     std::vector<std::string> indexed;

@@ -264,15 +264,6 @@ TEST(PStream, ABufferCanNotBeSent) {
     EXPECT_TRUE(log.Has("[ERR] Error stack: k.k"));
 }
 
-TEST(PStream, ABinaryIsRefusedInBothDirections) {
-    MemoryChannel channel(ToString({0x30, 0, 0, 0, 0, 0, 0, 0, 1, 'x'}));
-    PStream stream;
-    PObject value;
-    EXPECT_EQ(-5, stream.Recv(channel, value));
-    value = PObject::binary_type{0, 1, "/etc/passwd"};
-    EXPECT_EQ(-1, stream.Send(channel, value));
-}
-
 TEST(PStream, AfterAFailureTheStreamIsClean) {
     MemoryChannel channel;
     PStream stream;

@@ -7,6 +7,7 @@
 
 #include <atomic>
 #include <cerrno>
+#include <chrono>
 #include <filesystem>
 #include <optional>
 #include <thread>
@@ -224,6 +225,49 @@ TEST_P(ConfinedPathTest, AScopeWithManyFoldersReachesThemAll) {
         EXPECT_TRUE(PathPlace(m_dir / name).Open(O_RDONLY).IsValid()) << i;
         EXPECT_TRUE(PathPlace(m_dir / name).Open(O_RDONLY).IsValid()) << i;
     }
+}
+
+TEST_P(ConfinedPathTest, FoldersKeptForTheNextScopeServeItOnce) {
+    {
+        const PathPlaceScope scope;
+        EXPECT_TRUE(PathPlace(m_dir / "root/sub/file").IsReached());
+        PathPlaceScope::KeepForNext();
+    }
+    fs::rename(m_dir / "root/sub", m_dir / "root/moved");
+    {
+        const PathPlaceScope scope;
+        EXPECT_TRUE(PathPlace(m_dir / "root/sub/file").IsReached())
+            << "the folder that was checked";
+    }
+    const PathPlaceScope scope;
+    EXPECT_EQ(ENOENT, PathPlace(m_dir / "root/sub/file").Error());
+}
+
+TEST_P(ConfinedPathTest, FoldersKeptForTheNextScopeGrowOld) {
+    {
+        const PathPlaceScope scope;
+        EXPECT_TRUE(PathPlace(m_dir / "root/sub/file").IsReached());
+        PathPlaceScope::KeepForNext();
+    }
+    fs::rename(m_dir / "root/sub", m_dir / "root/moved");
+    std::this_thread::sleep_for(std::chrono::milliseconds(PLACE_KEEP_MS + 20));
+    const PathPlaceScope scope;
+    EXPECT_EQ(ENOENT, PathPlace(m_dir / "root/sub/file").Error());
+}
+
+TEST_P(ConfinedPathTest, NoFolderStaysOpenOnceKeptOnesAreClosed) {
+    const auto open_count = [] {
+        return std::distance(fs::directory_iterator("/proc/self/fd"), fs::directory_iterator());
+    };
+    const auto before = open_count();
+    {
+        const PathPlaceScope scope;
+        EXPECT_TRUE(PathPlace(m_dir / "root/sub/file").IsReached());
+        PathPlaceScope::KeepForNext();
+    }
+    EXPECT_LT(before, open_count());
+    PathPlaceScope::CloseKept();
+    EXPECT_EQ(before, open_count());
 }
 
 TEST_P(ConfinedPathTest, AFolderThatIsSwappedForALinkNeverLeadsOut) {

@@ -26,8 +26,7 @@ protected:
 TEST_F(LogTest, LineCarriesTagFileAndLineNumberBeforeTheText) {
     SLOG_ERR("disk %d of %s\n", 2, "box");
     const int line = __LINE__ - 1;
-    EXPECT_EQ("[ERR] tests/platform/log-test.cpp(" + std::to_string(line) + "): disk 2 of box\n",
-              g_line);
+    EXPECT_EQ("[ERR] " __FILE__ "(" + std::to_string(line) + "): disk 2 of box\n", g_line);
     EXPECT_EQ(LOG_ERR, g_priority);
 }
 

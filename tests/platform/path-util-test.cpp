@@ -11,6 +11,13 @@ TEST(PathUtil, ATrailingSlashIsAddedUnlessItIsThere) {
     EXPECT_EQ("/a/", PathAddTrailingSlash("/a/"));
 }
 
+TEST(PathUtil, TrailingSlashesAreTakenAway) {
+    EXPECT_EQ("", PathWithoutTrailingSlashes(""));
+    EXPECT_EQ("", PathWithoutTrailingSlashes("//"));
+    EXPECT_EQ("/a", PathWithoutTrailingSlashes("/a"));
+    EXPECT_EQ("/a/b", PathWithoutTrailingSlashes("/a/b//"));
+}
+
 struct Case {
     const char* path;
     const char* dir_name;

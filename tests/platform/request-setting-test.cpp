@@ -47,6 +47,17 @@ TEST(RequestSettingTest, StringIsChangedWhenItDiffersAndIsNotEmpty) {
     EXPECT_EQ("", text);
 }
 
+TEST(RequestSettingTest, StringEndsAtItsFirstNul) {
+    PObject request;
+    std::string text;
+    request["k"] = std::string("old\0and more", 12);
+    EXPECT_FALSE(GetChangedString(request, "k", "old", text)) << "that much of it is stored";
+    EXPECT_EQ("old", text);
+    request["k"] = std::string("\0new", 4);
+    EXPECT_FALSE(GetChangedString(request, "k", "old", text));
+    EXPECT_EQ("", text);
+}
+
 TEST(RequestSettingTest, OldValueAndOutMayBeTheSameString) {
     PObject request;
     request["k"] = "new";

@@ -147,10 +147,90 @@ TEST(TaskEntryHandler, SettingAnythingOfARemovedTaskFailsWithAWarningOnly) {
     const LogCapture log;
     EXPECT_EQ(-1, entries.SetTaskState(7, TASK_RUN_STATE_RUNNING));
     EXPECT_EQ(-1, entries.SetTaskVersionDir(8, "x"));
+    EXPECT_EQ(-1, entries.SetTaskSettings(MakeTask(9, 3)));
     EXPECT_EQ((std::vector<std::string>{"[WARN] Can not find task entry for task_id '7'",
-                                        "[WARN] Can not find task entry for task_id '8'"}),
+                                        "[WARN] Can not find task entry for task_id '8'",
+                                        "[WARN] Can not find task entry for task_id '9'"}),
               log.Lines());
     EXPECT_TRUE(entries.IsTaskEntryEmpty());
+}
+
+TEST(TaskEntryHandler, NewSettingsKeepTheStateAndTheVersionFolderOfTheEntry) {
+    TaskEntryHandler entries;
+    entries.AddTaskEntry(MakeTask(7, 3));
+    TaskRunInfo changed = MakeTask(7, 3);
+    changed.task_name = "new";
+    changed.dst_dir_path = "/volume1/new";
+    changed.version_dir = "read before the run began";
+    entries.SetTaskState(7, TASK_RUN_STATE_RUNNING);
+    entries.SetTaskVersionDir(7, "Ferrix Copy_2024-03-09_141502");
+    EXPECT_EQ(0, entries.SetTaskSettings(changed));
+    TaskRunInfo entry;
+    ASSERT_EQ(0, entries.GetTaskEntry(7, entry));
+    EXPECT_EQ("new", entry.task_name);
+    EXPECT_EQ("/volume1/new", entry.dst_dir_path);
+    EXPECT_EQ(TASK_RUN_STATE_RUNNING, entry.status);
+    EXPECT_EQ("Ferrix Copy_2024-03-09_141502", entry.version_dir);
+}
+
+// --- What a run goes by
+
+// The name tells which settings an entry holds.
+std::string RunName(const TaskEntryHandler& entries, uint64_t task_id) {
+    TaskRunInfo entry;
+    return entries.GetRunEntry(task_id, entry) == 0 ? entry.task_name : "none";
+}
+
+TaskRunInfo Renamed(uint64_t task_id, const std::string& name) {
+    TaskRunInfo task = MakeTask(task_id, 3);
+    task.task_name = name;
+    return task;
+}
+
+TEST(TaskEntryHandler, ARunGoesByTheSettingsThatItBeganWith) {
+    TaskEntryHandler entries;
+    entries.AddTaskEntry(Renamed(7, "old"));
+    EXPECT_EQ("old", RunName(entries, 7)) << "no run has begun";
+    TaskRunInfo run;
+    entries.SetTaskState(7, TASK_RUN_STATE_RUNNING);
+    ASSERT_EQ(0, entries.StartRun(7, run));
+    EXPECT_EQ("old", run.task_name);
+    ASSERT_EQ(0, entries.SetTaskSettings(Renamed(7, "new")));
+    EXPECT_EQ("old", RunName(entries, 7));
+    // The state is that of the present: a task that is being cancelled must be seen so.
+    entries.SetTaskState(7, TASK_RUN_STATE_CANCELING);
+    ASSERT_EQ(0, entries.GetRunEntry(7, run));
+    EXPECT_EQ("old", run.task_name);
+    EXPECT_EQ(TASK_RUN_STATE_CANCELING, run.status);
+    entries.SetTaskState(7, TASK_RUN_STATE_RUNNING);
+    EXPECT_EQ("old", RunName(entries, 7));
+}
+
+TEST(TaskEntryHandler, ARunEndsWhenItsTaskBecomesIdleOrIsRemovedOrRunsAnew) {
+    TaskEntryHandler entries;
+    entries.AddTaskEntry(Renamed(7, "first"));
+    TaskRunInfo run;
+    ASSERT_EQ(0, entries.StartRun(7, run));
+    ASSERT_EQ(0, entries.SetTaskSettings(Renamed(7, "second")));
+    ASSERT_EQ(0, entries.StartRun(7, run));  // as for a retry
+    EXPECT_EQ("second", run.task_name);
+    ASSERT_EQ(0, entries.SetTaskSettings(Renamed(7, "third")));
+    EXPECT_EQ("second", RunName(entries, 7));
+    entries.SetTaskState(7, TASK_RUN_STATE_IDLE);
+    EXPECT_EQ("third", RunName(entries, 7));
+    ASSERT_EQ(0, entries.StartRun(7, run));
+    entries.RemoveTaskEntry(7);
+    EXPECT_EQ("none", RunName(entries, 7));
+    entries.AddTaskEntry(Renamed(7, "fourth"));
+    EXPECT_EQ("fourth", RunName(entries, 7));
+}
+
+TEST(TaskEntryHandler, ARunOfARemovedTaskDoesNotBegin) {
+    TaskEntryHandler entries;
+    TaskRunInfo run = MakeTask(1, 1);
+    EXPECT_EQ(-1, entries.StartRun(7, run));
+    EXPECT_EQ(-1, entries.GetRunEntry(7, run));
+    EXPECT_EQ(1U, run.task_id) << "the out is unchanged";
 }
 
 TEST(TaskEntryHandler, ListsAreEmptiedFirstAndFilledInIdOrder) {

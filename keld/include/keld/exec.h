@@ -20,7 +20,7 @@ extern "C" {
 /* Runs `program` (absolute path) with the arguments that follow, ended by a null pointer, and waits
  * for its end. Returns its exit status, 0 to 255; negative when it could not be started, was ended
  * by a signal, or was killed because it took longer than the platform allows (10 seconds on plain
- * Linux). */
+ * Linux, but for /bin/cp and /bin/mv). */
 int KLIBCExec(const char* program, ...) KELD_SENTINEL;
 
 /* The same without waiting, and without a limit of time. Returns 0 when the program was started,

@@ -11,6 +11,7 @@ LINE = re.compile(rb"<(\d+)>\w{3} [ \d]\d \d\d:\d\d:\d\d (\w+): (.*)", re.S)
 class LogDaemon:
     def __init__(self, path="/dev/log"):
         self.lines = []
+        self._path = path
         self._lock = threading.Lock()
         self._socket = socket.socket(socket.AF_UNIX, socket.SOCK_DGRAM)
         self._socket.setsockopt(socket.SOL_SOCKET, socket.SO_RCVBUF, 8 << 20)
@@ -43,6 +44,16 @@ class LogDaemon:
                 return False
             time.sleep(0.05)
         return True
+
+    def lacks(self, part, mark=0):
+        """True if no line contains `part`, of all that were sent before this call."""
+        end = f"end of lines {time.monotonic_ns()}"
+        with socket.socket(socket.AF_UNIX, socket.SOCK_DGRAM) as sender:
+            sender.connect(self._path)
+            sender.send(f"<15>{time.strftime('%b %e %H:%M:%S')} test: {end}".encode())
+        if not self.expect(end, mark):
+            raise AssertionError("the log daemon of the test does not answer")
+        return not self.has(part, mark)
 
     def has(self, part, mark=0):
         return any(part in line for line in self.since(mark))

@@ -1,0 +1,13 @@
+// Moves the repository's files to another volume.
+//
+// The daemon must not run. Killed or failed at any moment, the volume that the settings name holds
+// a whole repository: they name the new volume once the copy there is complete and on the disk, and
+// only then does the old one leave its place.
+// Threads: one control program at a time.
+#pragma once
+
+#include <string>
+
+// True when the repository lies on `to`, and the settings say so. What lies in its place there is
+// kept in the folder "@tmp" of that volume. False (logged): it lies on `from`, if it did before.
+[[nodiscard]] bool MoveRepoData(const std::string& from, const std::string& to);

@@ -1,0 +1,33 @@
+// Makes the rows of an incremental task's file database true: a row may stay only once the copy
+// that it speaks of is on the disk (db/file-db.h).
+//
+// Tasks without a file database have nothing to prove: then nothing happens here.
+#pragma once
+
+#include <cstdint>
+
+struct TaskRunInfo;
+
+// Around a flush of the destination: made before it, settled after it.
+class RecordProof {
+public:
+    explicit RecordProof(const TaskRunInfo& task);
+
+    // The rows that were there before the flush are proven, or all that are not yet proven go.
+    void Settle(bool is_on_disk);
+
+private:
+    const TaskRunInfo& m_task;
+    int64_t m_mark = 0;
+};
+
+// Flushes the destination once some hundred files or a while have gone by since the last time. 0,
+// or the ErrorCode of the failure: then the rows in question are gone.
+[[nodiscard]] int FlushRecordsIfDue(const TaskRunInfo& task);
+
+// Whether a flush has failed since the last call. A later good one says nothing about the copies
+// that it covered.
+[[nodiscard]] bool TakeFlushFailure(const TaskRunInfo& task);
+
+// Every file of the source has been seen to, and what was copied is on the disk.
+void EndRecords(const TaskRunInfo& task);

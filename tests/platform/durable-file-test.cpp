@@ -1,0 +1,66 @@
+#include "platform/durable-file.h"
+
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+
+#include "support/temp-dir.h"
+
+namespace {
+
+class DurableFileTest : public testing::Test {
+protected:
+    TempDir m_dir;
+    const std::string m_path = m_dir / "record";
+    std::string m_content = "before";
+};
+
+TEST_F(DurableFileTest, WhatIsWrittenIsReadWhateverItsBytesAndLength) {
+    for (const size_t length : {size_t{0}, size_t{1}, size_t{4096}, size_t{100000}}) {
+        std::string content(length, '\0');
+        for (size_t at = 0; at < length; ++at) content[at] = static_cast<char>(at * 7);
+        ASSERT_EQ(0, WriteDurableFile(m_path, content));
+        EXPECT_EQ(1, ReadDurableFile(m_path, m_content));
+        EXPECT_EQ(content, m_content);
+    }
+    EXPECT_NE(0, access((m_path + ".new").c_str(), F_OK));
+}
+
+TEST_F(DurableFileTest, AMissingFileIsNoFailure) {
+    EXPECT_EQ(0, ReadDurableFile(m_path, m_content));
+    EXPECT_EQ("before", m_content);
+}
+
+TEST_F(DurableFileTest, WhatCannotBeReadIsAFailure) {
+    m_dir.MakeDir("record");
+    EXPECT_EQ(-1, ReadDurableFile(m_path, m_content));
+    EXPECT_EQ(EISDIR, errno);
+}
+
+TEST_F(DurableFileTest, ALinkIsNotFollowed) {
+    m_dir.Write("elsewhere", "x");
+    ASSERT_EQ(0, symlink((m_dir / "elsewhere").c_str(), m_path.c_str()));
+    EXPECT_EQ(-1, ReadDurableFile(m_path, m_content));
+    ASSERT_EQ(0, WriteDurableFile(m_path, "ours"));
+    EXPECT_EQ("x", ReadWholeFile(m_dir / "elsewhere")) << "the link was replaced";
+}
+
+TEST_F(DurableFileTest, AFailedWriteLeavesTheOldContent) {
+    ASSERT_EQ(0, WriteDurableFile(m_path, "old"));
+    m_dir.MakeDir("record.new");  // in the way of the new file
+    EXPECT_EQ(-1, WriteDurableFile(m_path, "new"));
+    EXPECT_EQ("old", ReadWholeFile(m_path));
+    EXPECT_EQ(-1, WriteDurableFile(m_dir / "no-folder/record", "new"));
+    EXPECT_EQ(ENOENT, errno);
+}
+
+TEST_F(DurableFileTest, TheFileIsItsOwnersAlone) {
+    ASSERT_EQ(0, WriteDurableFile(m_path, "x"));
+    struct stat info {};
+    ASSERT_EQ(0, stat(m_path.c_str(), &info));
+    EXPECT_EQ(0600U, info.st_mode & 07777);
+}
+
+}  // namespace
