@@ -22,13 +22,21 @@ constexpr int kNameTries = 64;
 // Whatever the umask: the content is for the receiver alone.
 constexpr mode_t kFileMode = 0600;
 
-bool HasSize(const std::string& path, uint64_t size) {
+// Cuts the file off where the rest of the content goes: a transfer that broke off in the middle of
+// a block may have left more than it counted, also where appending is all that is asked for. A file
+// that is shorter has lost what was counted: a gap filled with zeros would pass for content.
+int CutAt(const std::string& path, uint64_t offset) {
     struct stat info {};
-    return stat(path.c_str(), &info) == 0 && static_cast<uint64_t>(info.st_size) == size;
+    if (stat(path.c_str(), &info) != 0) return -1;
+    const auto size = static_cast<uint64_t>(info.st_size);
+    if (size == offset) return 0;
+    if (size > offset) return truncate(path.c_str(), static_cast<off_t>(offset));
+    errno = EINVAL;
+    return -1;
 }
 
 int OpenToWrite(const std::string& path, int flags) {
-    const int file = open(path.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC | flags, kFileMode);
+    const int file = open(path.c_str(), O_WRONLY | O_CLOEXEC | flags, kFileMode);
     if (file < 0 && errno != EEXIST) SLOG_ERR("fopen(%s) error\n", path.c_str());
     return file;
 }
@@ -59,7 +67,7 @@ int BinaryReceiver::Receive(uint64_t length, PObject::binary_type& record) {
 int BinaryReceiver::OpenNew(std::string& path) {
     for (int i = 0; i < kNameTries; ++i) {
         const std::string name = m_names.NewPath(m_directory);
-        m_file.Reset(OpenToWrite(name, O_EXCL | O_NOFOLLOW));
+        m_file.Reset(OpenToWrite(name, O_CREAT | O_EXCL | O_NOFOLLOW));
         if (m_file.IsValid()) {
             path = name;
             return 0;
@@ -72,12 +80,9 @@ int BinaryReceiver::OpenNew(std::string& path) {
 
 int BinaryReceiver::OpenNamed(const PObject::binary_type& record) {
     SLOG_DBG("store binary to %s, offset %llu\n", record.path.c_str(), Llu(record.offset));
-    int flags = O_TRUNC;
+    int flags = O_CREAT | O_TRUNC;
     if (record.offset != 0) {
-        // A transfer that broke off in the middle of a block may have left more than it counted.
-        const bool ends_there =
-            record.offset == record.length && HasSize(record.path, record.offset);
-        if (!ends_there && truncate(record.path.c_str(), static_cast<off_t>(record.offset)) != 0) {
+        if (CutAt(record.path, record.offset) != 0) {
             SLOG_ERR("truncate: %s (%d)\n", std::strerror(errno), errno);
             return kCannotStore;
         }

@@ -37,7 +37,7 @@ public:
     // Stores `length` bytes as `record` says: over the file when its offset is 0, else from the
     // offset on, where the file is cut off. Afterwards, whatever the result, offset and length of
     // the record both tell where the content stored ends. ERR_INVALID_ARGUMENT: the disk is full;
-    // -1: no memory, no name, or the file cannot be written.
+    // -1: no memory, no name, the file cannot be written, or it ends before the offset.
     [[nodiscard]] int Receive(uint64_t length, PObject::binary_type& record);
 
 private:

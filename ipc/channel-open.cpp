@@ -8,6 +8,7 @@
 #include <cstring>
 
 #include "ipc/channel.h"
+#include "ipc/deadline.h"
 #include "ipc/wait-ready.h"
 #include "utils/error-code.h"
 #include "utils/log.h"
@@ -29,6 +30,11 @@ void ClosePlain(void* handle) {
     close(descriptor);
     SLOG_DBG("Channel: socket %d closed\n", descriptor);
     delete static_cast<int*>(handle);
+}
+
+// 0, or the error. Zero is no limit.
+int LimitSending(int descriptor, const timeval& limit) {
+    return setsockopt(descriptor, SOL_SOCKET, SO_SNDTIMEO, &limit, sizeof(limit)) == 0 ? 0 : errno;
 }
 
 }  // namespace
@@ -124,8 +130,7 @@ int Channel::Open(const std::string& path) {
     sockaddr_un address{};
     address.sun_family = AF_UNIX;
     path.copy(address.sun_path, sizeof(address.sun_path) - 1);
-    if (connect(descriptor.Get(), reinterpret_cast<const sockaddr*>(&address), sizeof(address)) !=
-        0) {
+    if (ConnectInTime(descriptor.Get(), address) != 0) {
         SLOG_ERR("Channel: Can not connect to server at '%s'. %s\n", path.c_str(),
                  std::strerror(errno));
         return ERR_IO;
@@ -133,6 +138,27 @@ int Channel::Open(const std::string& path) {
     if (SetNonBlock(descriptor.Get()) != 0) return ERR_SYSTEM;
     Adopt(descriptor.Release());
     return 0;
+}
+
+// A listener that accepts nobody, its backlog full, blocks a connect until the limit on sending is
+// over. That is the limit of one wait, so that the abort flag and the total are looked at.
+int Channel::ConnectInTime(int descriptor, const sockaddr_un& address) const {
+    const Deadline deadline({static_cast<time_t>(m_total_timeout), 0});
+    int error = LimitSending(descriptor, m_operation_timeout);
+    while (error == 0) {
+        if (connect(descriptor, reinterpret_cast<const sockaddr*>(&address), sizeof(address)) ==
+            0) {
+            error = LimitSending(descriptor, {0, 0});
+            break;
+        }
+        error = errno;
+        if (error != EAGAIN && error != EINTR) break;
+        SLOG_DBG("select: %s\n", error == EINTR ? "EINTR" : "timeout");
+        const bool is_late = m_total_timeout != 0 && deadline.IsOver();
+        error = IsAborted() ? EINTR : is_late ? ETIMEDOUT : 0;
+    }
+    errno = error;
+    return error == 0 ? 0 : -1;
 }
 
 void Channel::Close() {

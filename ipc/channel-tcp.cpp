@@ -65,13 +65,12 @@ int Channel::Connect(int descriptor, const char* ip, int port) {
 int Channel::WaitForConnect(int descriptor) const {
     for (StallCount stalls(m_total_timeout);;) {
         if (IsAborted()) return -1;
-        const int ready = WaitReady(descriptor, true, m_operation_timeout);
+        const int ready = WaitDespiteSignals(descriptor, true, m_operation_timeout);
         if (ready > 0) return 0;
-        if (ready < 0 && errno != EINTR) {
+        if (ready < 0) {
             SLOG_ERR("select: %s\n", std::strerror(errno));
             return ERR_SYSTEM;
         }
-        if (ready < 0) continue;
         SLOG_DBG("select: timeout\n");
         if (stalls.CountTimeout()) {
             SLOG_ERR("Channel timed out during connect (%u seconds), abort anyway\n",

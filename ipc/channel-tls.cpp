@@ -38,11 +38,18 @@ int SetUpServer(SSL* ssl, const std::string& certificate, const std::string& key
     return 0;
 }
 
+// Tried on another object first: the call fails where the library has the cipher no more, and then
+// leaves none for anything before TLS 1.3, whatever the library's configuration file says.
+bool OfferOldCipher(SSL* ssl, SSL_CTX* context) {
+    static constexpr const char* kCipher = "RC4-MD5";
+    const UniqueSsl probe(SSL_new(context));
+    return probe != nullptr && SSL_set_cipher_list(probe.get(), kCipher) == 1 &&
+           SSL_set_cipher_list(ssl, kCipher) == 1;
+}
+
 int SetUpClient(SSL* ssl, SSL_CTX* context, const std::string& trusted) {
-    if (SSL_set_cipher_list(ssl, "RC4-MD5") != 1) {
+    if (!OfferOldCipher(ssl, context)) {
         SLOG_WARN("can't set cipher suit to SSL3_TXT_RSA_RC4_128_MD5\n");
-        // The failed call leaves no cipher for anything before TLS 1.3.
-        static_cast<void>(SSL_set_cipher_list(ssl, "DEFAULT"));
         ERR_clear_error();
     }
     if (SSL_CTX_load_verify_locations(context, trusted.c_str(), nullptr) != 1) {
@@ -93,6 +100,13 @@ int Channel::ConvertToSSLChannel(bool server) {
         SLOG_WARN("ConvertToSSLChannel: Channel is SSL channel, no need to be converted\n");
         return 0;
     }
+    const int result = BecomeTls(server);
+    // It was to travel inside TLS: closing the channel would send it as it is.
+    if (result != 0) ResetWrite();
+    return result;
+}
+
+int Channel::BecomeTls(bool server) {
     ssl_st* ssl = nullptr;
     ssl_ctx_st* context = nullptr;
     if (InitSSL(ssl, context, server) != 0) {
@@ -122,6 +136,9 @@ int Channel::StartSSL(ssl_st* ssl) {
     SSL_set_app_data(ssl, this);
     // The rest of a write comes from another place of the ring, or after a look at the abort flag.
     SSL_set_mode(ssl, SSL_MODE_ENABLE_PARTIAL_WRITE | SSL_MODE_ACCEPT_MOVING_WRITE_BUFFER);
+    // A record that carries no text ends a call, so that a peer that sends nothing else does not
+    // keep the library from coming back.
+    SSL_clear_mode(ssl, SSL_MODE_AUTO_RETRY);
     if (SSLHandshake(ssl, m_operation_timeout, m_total_timeout) != 0) {
         SLOG_ERR("Open to SSL connect to server failed\n");
         return ERR_IO;
@@ -157,14 +174,13 @@ int Channel::SSLHandshake(ssl_st* ssl, const timeval& timeout, unsigned total) c
 // One wait. 0 also after a timeout, while the limit is not reached.
 int Channel::WaitForHandshake(ssl_st* ssl, bool for_writing, const timeval& timeout,
                               StallCount& stalls) const {
-    const int ready = WaitReady(SSL_get_fd(ssl), for_writing, timeout);
+    const int ready = WaitDespiteSignals(SSL_get_fd(ssl), for_writing, timeout);
     if (ready > 0) {
         SLOG_DBG("SSLHandshake: reset timeout\n");
         stalls.Reset();
         return 0;
     }
     if (ready < 0) {
-        if (errno == EINTR) return 0;
         SLOG_ERR("SSLHandshake: select: Error Code: %s (%d)\n", std::strerror(errno), errno);
         return -1;
     }

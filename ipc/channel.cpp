@@ -123,6 +123,7 @@ int Channel::Read(void* buffer, size_t length, size_t* got) {
     *got = 0;
     if (IsClosed()) return ERR_IO;
     auto* out = static_cast<uint8_t*>(buffer);
+    if (m_capacity == 0 && length != 0) return ERR_INVALID_ARGUMENT;  // as a write is
     size_t total = TakeBuffered(out, length);
     while (total < length) {  // the ring is empty here
         const size_t chunk = std::min(length - total, m_capacity);

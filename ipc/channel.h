@@ -5,7 +5,7 @@
 // Ownership: an open channel owns its descriptor; the destructor flushes and closes.
 // Results: 0, or a negative ErrorCode ("utils/error-code.h"): ERR_IO, ERR_SYSTEM,
 // ERR_INVALID_ARGUMENT, ERR_CONNECTION_TIMEOUT, ERR_SSL_VERIFY; -1 when the abort flag ended the
-// operation. Integers are big-endian on the wire.
+// operation, but ERR_IO for an Open and a conversion. Integers are big-endian on the wire.
 #pragma once
 
 #include <sys/time.h>
@@ -19,6 +19,7 @@
 #include <string_view>
 
 class StallCount;
+struct sockaddr_un;
 struct ssl_ctx_st;  // OpenSSL's SSL_CTX
 struct ssl_st;      // OpenSSL's SSL
 
@@ -32,7 +33,8 @@ public:
     Channel& operator=(const Channel&) = delete;
     virtual ~Channel();
 
-    // Connects to a domain socket. A connect has no timeout.
+    // Connects to a domain socket, and gives up after the total timeout when its listener accepts
+    // nobody. Of a longer path only the first 107 bytes count.
     [[nodiscard]] virtual int Open(const std::string& path);
     // Takes a connected descriptor over, only on success. `tune` sets linger to one second and
     // makes the descriptor non-blocking.
@@ -42,14 +44,16 @@ public:
     // Flushes what is pending, shuts the socket down and closes it. Harmless on a closed channel.
     virtual void Close();
 
-    // Seconds without any progress after which a read or a flush fails; 0 is no limit.
+    // Seconds without any progress after which a read, a flush or the Open of a path fails; 0 is no
+    // limit. Through TLS, records that carry no text are no progress.
     virtual void SetTimeout(unsigned seconds);
     // An operation that waits ends with -1 within a second after *flag is set. May be null.
     virtual void SetAbortFlag(const std::atomic<int>* flag);
 
     // From now on the open connection speaks TLS; `server` says which end this one is. Nothing to
     // do when it does already. Flush before: what is pending is sent inside TLS, what was received
-    // before is dropped. After a failure the channel is good only for closing.
+    // before is dropped. After a failure what is pending is dropped too, and the channel is good
+    // only for closing.
     // A client checks the server's certificate against the trusted ones only when verification is
     // not skipped, and never the name in it. SIGPIPE has to be ignored by the process.
     [[nodiscard]] virtual int ConvertToSSLChannel(bool server);
@@ -138,7 +142,9 @@ protected:
 private:
     [[nodiscard]] bool RefuseWhenOpen() const;
     void Adopt(int descriptor);
+    [[nodiscard]] int ConnectInTime(int descriptor, const sockaddr_un& address) const;
     [[nodiscard]] int WaitForConnect(int descriptor) const;
+    [[nodiscard]] int BecomeTls(bool server);
     // Makes both ends of what OpenSSL needs, or neither. The caller frees them.
     [[nodiscard]] static int InitSSL(ssl_st*& ssl, ssl_ctx_st*& context, bool server);
     [[nodiscard]] int StartSSL(ssl_st* ssl);

@@ -13,7 +13,10 @@ void IPCSender::Close() { m_channel.Close(); }
 
 int IPCSender::Send(const PObject& value) {
     PStream stream;
-    return stream.Send(m_channel, value) < 0 ? -1 : 0;
+    if (stream.Send(m_channel, value) >= 0) return 0;
+    // Half a request is no request; and closing would wait once more for a peer that does not read.
+    m_channel.ResetWrite();
+    return -1;
 }
 
 int IPCSender::Recv(PObject& value) {

@@ -14,10 +14,13 @@ namespace {
 
 constexpr int kBacklog = 8;
 
+// Cut off, it would name another file.
+bool IsTooLong(const std::string& path) { return path.size() >= sizeof(sockaddr_un::sun_path); }
+
 int Bind(int descriptor, const std::string& path) {
     sockaddr_un address{};
     address.sun_family = AF_UNIX;
-    if (path.size() >= sizeof(address.sun_path)) {  // cut off, it would name another file
+    if (IsTooLong(path)) {
         errno = ENAMETOOLONG;
         return -1;
     }
@@ -48,7 +51,7 @@ int IPCListener::Listen(const std::string& path) {
         return -1;
     }
     m_path = path;
-    unlink(path.c_str());  // left by an earlier process
+    if (!IsTooLong(path)) unlink(path.c_str());  // left by an earlier process
     const int on = 1;
     setsockopt(m_descriptor, SOL_SOCKET, SO_REUSEADDR, &on, sizeof(on));
     if (Bind(m_descriptor, path) != 0) {

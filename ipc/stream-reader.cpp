@@ -24,12 +24,18 @@ int PStream::Reader::ReadTree(PObject& root) {
         if (tag == TAG_ARRAY || tag == TAG_MAP) {
             OpenContainer(*value, tag == TAG_MAP);
         } else {
-            if (const int result = ReadLeaf(tag, *value); result != 0) return result;
+            if (const int result = ReadLeaf(tag, *value); result != 0) {
+                KeepRecord(*value);
+                return result;
+            }
             EndOfChild();
         }
         for (value = nullptr; value == nullptr;) {
             if (m_levels.empty()) return 0;
-            if (const int result = NextChild(&tag, &value); result != 0) return result;
+            if (const int result = NextChild(&tag, &value); result != 0) {
+                if (value != nullptr) KeepRecord(*value);
+                return result;
+            }
             if (value == nullptr) CloseContainer();
         }
     }
@@ -176,16 +182,24 @@ int PStream::Reader::ReadBinary(PObject& target) {
     return result;
 }
 
-// What stood in the caller's value where the present child stands. Found only when it is asked for,
-// by the keys on the error stack, so that values without binaries cost nothing.
+// What stood in the caller's value where the present child stands; an element of an array is a new
+// value. Found only when it is asked for, by the keys on the error stack, so that values without
+// binaries cost nothing.
 const PObject& PStream::Reader::FormerTarget() const {
     const PObject* former = &m_former;
     size_t key = 0;
     for (const PObject* level : m_levels) {
-        former = level->IsMap() ? &(*former)[m_stream.m_error_stack[key++]]
-                                : &(*former)[static_cast<int>(level->AsArray().size() - 1)];
+        if (!level->IsMap()) return PObject::empty_object;
+        former = &(*former)[m_stream.m_error_stack[key++]];
     }
     return *former;
+}
+
+// Nothing of the child has arrived: the caller's record of a broken transfer still says where to go
+// on.
+void PStream::Reader::KeepRecord(PObject& child) {
+    PublishKey();
+    if (child.IsNull() && FormerTarget().IsBinary()) child = FormerTarget().AsBinary();
 }
 
 int PStream::Reader::TakeByte(uint8_t* out) {

@@ -30,6 +30,7 @@ private:
     [[nodiscard]] int ReadString(std::string_view& text);
     [[nodiscard]] int ReadBinary(PObject& target);
     [[nodiscard]] const PObject& FormerTarget() const;
+    void KeepRecord(PObject& child);
     [[nodiscard]] int Take(void* out, size_t length);
     [[nodiscard]] int TakeByte(uint8_t* out);
     [[nodiscard]] bool HasInPiece(size_t length) const { return m_piece.size() >= length; }

@@ -12,16 +12,20 @@
 // A key that begins with '_' is sent without it. Buffers cannot be sent.
 //
 // A binary is a stretch of a file. The sender reads it from its file, the receiver stores it in a
-// file: where a binary with a path stands at the same place of the target that Recv is given, in
-// that file from its offset on, so that a broken transfer can go on; else in a new file of the temp
-// directory. After Recv, also a failed one, offset and length both tell where its content ends.
+// file, made for its owner alone: where a binary with a path stands at the same place of the target
+// that Recv is given, in that file from its offset on, so that a broken transfer can go on; else,
+// and for every element of an array, in a new file of the temp directory. After Recv, also a failed
+// one, offset and length both tell where its content ends. A record is left as it was by a transfer
+// that fails before its content begins, but in a map those of members that have not arrived are
+// gone: the caller keeps a copy of a target that holds several.
 // Files stay when a transfer fails; removing them is the caller's affair.
 //
 // Threads: one thread sends and receives; GetStatus may be called from any.
 // Results: 0; -1 for a value that cannot be sent, and for a file that cannot be read, made or
 // written; ERR_IO when the channel failed; -4 when the disk is full; -5 for bytes that are no
 // value, and for a file that ended before the length of its binary. After a failure the connection
-// is out of step and has to be closed; a target of Recv is then partly filled.
+// is out of step and has to be closed; a target of Recv is then partly filled, an array with the
+// element that broke off as its last.
 #pragma once
 
 #include <pthread.h>

@@ -9,8 +9,10 @@
 #include <cerrno>
 #include <climits>
 #include <cstring>
+#include <string_view>
 
 #include "ipc/channel.h"
+#include "ipc/deadline.h"
 #include "ipc/wait-ready.h"
 #include "utils/error-code.h"
 #include "utils/log.h"
@@ -37,15 +39,33 @@ void CloseTls(void* handle) {
     SLOG_DBG("Channel: socket %d closed\n", descriptor);
 }
 
-// The lines of a plain transport for the same trouble; a goodbye of the peer is an end like any.
+// The peer has hung up: with a goodbye, without one, or before this operation, and then the library
+// has no more to say about it.
+bool IsEnd(int code, int error) {
+    const unsigned long first = ERR_peek_error();
+    return code == SSL_ERROR_ZERO_RETURN || (code == SSL_ERROR_SYSCALL && error == 0) ||
+           (code == SSL_ERROR_SSL && ERR_GET_LIB(first) == ERR_LIB_SSL &&
+            ERR_GET_REASON(first) == SSL_R_UNEXPECTED_EOF_WHILE_READING);
+}
+
+// The lines of a plain transport for the same trouble.
 void LogFailure(bool is_write, int code, int error) {
+    const bool is_end = IsEnd(code, error);
     SLOG_ERR("%s: %s\n", is_write ? "write" : "read",
              std::strerror(code == SSL_ERROR_SYSCALL ? error : 0));
     LogSslErrors();
-    if (code != SSL_ERROR_ZERO_RETURN) return;
-    SLOG_ERR(
-        "Diagnose: select says the socket is %s but actually we can't %s ... connection closed?\n",
-        is_write ? "writeable" : "readable", is_write ? "write" : "read");
+    if (is_end) {
+        SLOG_ERR(
+            "Diagnose: select says the socket is %s but actually we can't %s ... connection "
+            "closed?\n",
+            is_write ? "writeable" : "readable", is_write ? "write" : "read");
+    }
+    if (!is_write) SLOG_ERR("Diagnose: SSL_read failed\n");
+}
+
+// Part of a record has come, and nothing is known yet of what it carries.
+bool IsWithinRecord(const SSL* ssl) {
+    return std::string_view(SSL_rstate_string(ssl)) == "RB";  // it reads the body
 }
 
 }  // namespace
@@ -77,8 +97,12 @@ int Channel::MoveThroughSSL(ssl_st* ssl, bool for_writing, const timeval& timeou
                             const Move& move) {
     const auto* channel = static_cast<const Channel*>(SSL_get_app_data(ssl));
     const bool is_write = for_writing;
-    // Bytes of a record that is decrypted already make no socket readable.
-    bool must_wait = for_writing || SSL_pending(ssl) == 0;
+    const Deadline deadline(timeout);
+    // Bytes of a record that is decrypted already make no socket readable. And when the last try
+    // ended with a wish for the other direction, this operation may be the one that has it, or not:
+    // the library knows.
+    bool must_wait = SSL_want(ssl) != (is_write ? SSL_READING : SSL_WRITING) &&
+                     (is_write || SSL_pending(ssl) == 0);
     for (;;) {
         if (must_wait) {
             const int result = WaitForSocket(SSL_get_fd(ssl), for_writing, timeout);
@@ -96,8 +120,12 @@ int Channel::MoveThroughSSL(ssl_st* ssl, bool for_writing, const timeval& timeou
         }
         for_writing = code == SSL_ERROR_WANT_WRITE;
         must_wait = true;
-        // A peer that lets a record trickle in keeps this loop going.
+        // A peer that lets a record trickle in, or sends records without text, keeps this loop
+        // going. The latter are silence, and the caller counts it.
         if (channel->IsAborted()) return -1;
+        if (!for_writing && deadline.IsOver() && !IsWithinRecord(ssl)) {
+            return ERR_CONNECTION_TIMEOUT;
+        }
     }
 }
 
@@ -107,10 +135,7 @@ ssize_t Channel::SSLReadFd(ssl_st* ssl, void* buffer, size_t length, const timev
         return ERR_INVALID_ARGUMENT;
     }
     const int size = static_cast<int>(std::min<size_t>(length, INT_MAX));
-    const int result =
-        MoveThroughSSL(ssl, false, timeout, [&] { return SSL_read(ssl, buffer, size); });
-    if (result == ERR_IO) SLOG_ERR("Diagnose: SSL_read failed\n");
-    return result;
+    return MoveThroughSSL(ssl, false, timeout, [&] { return SSL_read(ssl, buffer, size); });
 }
 
 ssize_t Channel::SSLWriteFd(ssl_st* ssl, const void* buffer, size_t length,

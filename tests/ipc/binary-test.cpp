@@ -1,70 +1,16 @@
 // Binaries: stretches of files on the wire.
-#include <gtest/gtest.h>
 #include <signal.h>
 #include <sys/resource.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <filesystem>
-
+#include "ipc/binary-fixture.h"
 #include "ipc/binary-transfer.h"
 #include "ipc/channel.h"
-#include "ipc/memory-channel.h"
-#include "ipc/pobject.h"
-#include "ipc/stream.h"
 #include "support/log-capture.h"
-#include "support/temp-dir.h"
 #include "utils/error-code.h"
 
 namespace {
-
-namespace fs = std::filesystem;
-
-std::string Head(uint64_t length) {
-    std::string head = "\x30";
-    for (int shift = 56; shift >= 0; shift -= 8) head += static_cast<char>(length >> shift);
-    return head;
-}
-
-PObject Binary(uint64_t offset, uint64_t length, const std::string& path) {
-    PObject value;
-    value = PObject::binary_type{offset, length, path};
-    return value;
-}
-
-std::string Pattern(size_t size) {
-    std::string out(size, '\0');
-    for (size_t i = 0; i < size; ++i) out[i] = static_cast<char>(i * 31 % 251);
-    return out;
-}
-
-class BinaryTest : public testing::Test {
-protected:
-    [[nodiscard]] int Send(const PObject& value) {
-        m_channel.pipe.output.clear();
-        const int result = m_stream.Send(m_channel, value);
-        static_cast<void>(m_channel.FlushWrite(0));  // what a failure has left in the ring
-        return result;
-    }
-    [[nodiscard]] int Recv(const std::string& bytes, PObject& value) {
-        m_channel.ResetRead();
-        m_channel.pipe.input = bytes;
-        m_channel.pipe.position = 0;
-        return m_stream.Recv(m_channel, value);
-    }
-    void SetUp() override { m_stream.SetTempDirectory(m_temp); }
-    [[nodiscard]] std::vector<std::string> Temps() const {
-        std::vector<std::string> out;
-        for (const auto& entry : fs::directory_iterator(m_temp)) out.push_back(entry.path());
-        return out;
-    }
-
-    TempDir m_dir;
-    std::string m_temp = m_dir.MakeDir("temp");
-    MemoryChannel m_channel;
-    PStream m_stream;
-    PObject m_value;
-};
 
 class BinarySendTest : public BinaryTest {};
 
@@ -213,94 +159,12 @@ TEST_F(BinaryRecvTest, APathWithOffsetZeroIsWrittenOver) {
     EXPECT_TRUE(Temps().empty());
 }
 
-TEST_F(BinaryRecvTest, AnOffsetAtTheEndIsAppendedTo) {
-    m_value = Binary(6, 6, m_dir.Write("file", "begin-"));
-    ASSERT_EQ(0, Recv(Head(3) + "end", m_value));
-    EXPECT_EQ("begin-end", ReadWholeFile(m_dir / "file"));
-    EXPECT_EQ(9U, m_value.AsBinary().offset);
-    EXPECT_EQ(9U, m_value.AsBinary().length);
-}
-
-TEST_F(BinaryRecvTest, AnOffsetBeforeTheEndCutsTheFileThere) {
-    m_value = Binary(4, 10, m_dir.Write("file", "0123456789"));
-    ASSERT_EQ(0, Recv(Head(1) + "x", m_value));
-    EXPECT_EQ("0123x", ReadWholeFile(m_dir / "file"));
-    EXPECT_EQ(5U, m_value.AsBinary().length);
-}
-
-TEST_F(BinaryRecvTest, MoreThanWasCountedIsCutOff) {
-    m_value = Binary(4, 4, m_dir.Write("file", "0123456789"));
-    ASSERT_EQ(0, Recv(Head(1) + "x", m_value));
-    EXPECT_EQ("0123x", ReadWholeFile(m_dir / "file"));
-}
-
-TEST_F(BinaryRecvTest, AFileThatCanNotBeCutFails) {
-    m_value = Binary(4, 4, m_dir / "none");
-    LogCapture log;
-    EXPECT_EQ(-1, Recv(Head(1) + "x", m_value));
-    EXPECT_TRUE(log.Has("[ERR] truncate: No such file or directory (2)"));
-    EXPECT_EQ(4U, m_value.AsBinary().offset);
-    EXPECT_EQ(4U, m_value.AsBinary().length);
-    EXPECT_NE(0, access((m_dir / "none").c_str(), F_OK));
-    m_value = Binary(UINT64_MAX, 0, m_dir.Write("file", "abc"));
-    EXPECT_EQ(-1, Recv(Head(1) + "x", m_value));
-    EXPECT_TRUE(log.Has("[ERR] truncate: Invalid argument (22)"));
-    EXPECT_EQ("abc", ReadWholeFile(m_dir / "file"));
-}
-
 TEST_F(BinaryRecvTest, AFileThatCanNotBeMadeFails) {
     m_value = Binary(0, 7, m_dir / "none/file");
     EXPECT_EQ(-1, Recv(Head(1) + "x", m_value));
     EXPECT_EQ(0U, m_value.AsBinary().length);
     m_value = Binary(0, 0, m_dir.Path());  // a folder
     EXPECT_EQ(-1, Recv(Head(1) + "x", m_value));
-}
-
-TEST_F(BinaryRecvTest, AMemberThatNamesAPlaceIsStoredThere) {
-    m_value["deep"]["list"].AsArray().emplace_back(1);
-    m_value["deep"]["list"].AsArray().push_back(Binary(2, 2, m_dir.Write("file", "ab")));
-    m_value["other"] = Binary(0, 0, m_dir / "other");
-    m_value["gone"] = "dropped";
-    const std::string bytes = std::string("\x42\x10\0\4deep\x42\x10\0\4list\x41\1\1\7", 20) +
-                              Head(1) + "c" + "\x40\x40" + std::string("\x10\0\5fresh", 8) +
-                              Head(1) + "d" + std::string("\x10\0\5other", 8) + Head(1) + "e\x40";
-    ASSERT_EQ(0, Recv(bytes, m_value));
-    EXPECT_EQ("abc", ReadWholeFile(m_dir / "file"));
-    EXPECT_EQ("e", ReadWholeFile(m_dir / "other"));
-    EXPECT_EQ(7, m_value["deep"]["list"].AsArray()[0].AsInt32());
-    EXPECT_EQ(3U, m_value["deep"]["list"].AsArray()[1].AsBinary().length);
-    ASSERT_EQ(1U, Temps().size());
-    EXPECT_EQ("d", ReadWholeFile(m_value["fresh"].AsBinary().path));
-    EXPECT_FALSE(m_value.HasMember("gone"));
-}
-
-TEST_F(BinaryRecvTest, ARepeatedKeyReplacesTheContent) {
-    m_value["a"] = Binary(0, 0, m_dir / "file");
-    const std::string key("\x10\0\1a", 4);
-    ASSERT_EQ(0, Recv("\x42" + key + Head(5) + "first" + key + Head(2) + "2." + "\x40", m_value));
-    EXPECT_EQ("2.", ReadWholeFile(m_dir / "file"));
-    EXPECT_EQ(2U, m_value["a"].AsBinary().length);
-}
-
-TEST_F(BinaryRecvTest, APeerThatHangsUpLeavesWhatIsNeededToGoOn) {
-    const std::string content = Pattern(2 * kBinaryBlock + 100);
-    const std::string bytes = Head(content.size()) + content;
-    for (const size_t cut : {0U, 1U, 8U}) {
-        PObject value;
-        EXPECT_EQ(ERR_IO, Recv(bytes.substr(0, cut), value)) << cut;
-        EXPECT_TRUE(Temps().empty()) << cut;
-    }
-    LogCapture log;
-    EXPECT_EQ(ERR_IO, Recv(bytes.substr(0, 9 + kBinaryBlock + 50), m_value));
-    EXPECT_TRUE(log.Has("[WARN] Channel: -2"));
-    const PObject::binary_type record = m_value.AsBinary();
-    EXPECT_EQ(kBinaryBlock, record.offset);
-    EXPECT_EQ(kBinaryBlock, record.length);
-    EXPECT_TRUE(content.substr(0, kBinaryBlock) == ReadWholeFile(record.path));
-    const std::string rest = content.substr(record.offset);
-    EXPECT_EQ(0, Recv(Head(rest.size()) + rest, m_value));
-    EXPECT_TRUE(content == ReadWholeFile(record.path));
-    EXPECT_EQ(content.size(), m_value.AsBinary().length);
 }
 
 TEST_F(BinaryRecvTest, AHostileLengthTakesNoMoreThanWhatComes) {

@@ -12,6 +12,7 @@
 #include <thread>
 #include <vector>
 
+#include "ipc/binary-fixture.h"
 #include "ipc/channel.h"
 #include "ipc/memory-channel.h"
 #include "ipc/stream.h"
@@ -22,12 +23,6 @@
 namespace {
 
 namespace fs = std::filesystem;
-
-std::string Head(uint64_t length) {
-    std::string head = "\x30";
-    for (int shift = 56; shift >= 0; shift -= 8) head += static_cast<char>(length >> shift);
-    return head;
-}
 
 class BinaryNameTest : public testing::Test {
 protected:

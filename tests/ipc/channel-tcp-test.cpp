@@ -9,6 +9,7 @@
 #include <thread>
 
 #include "ipc/channel.h"
+#include "ipc/signal-storm.h"
 #include "ipc/simple-ipc.h"
 #include "support/log-capture.h"
 #include "support/temp-dir.h"
@@ -31,6 +32,9 @@ public:
     [[nodiscard]] int SetNonBlock(int descriptor) const override {
         return fails_non_block ? -1 : Channel::SetNonBlock(descriptor);
     }
+
+    void WaitMilliseconds(int milliseconds) { m_operation_timeout = {0, milliseconds * 1000}; }
+    [[nodiscard]] int Descriptor() const { return kPlainTransport.get_descriptor(m_handle); }
 
     bool fails_socket = false;
     bool fails_linger = false;
@@ -106,6 +110,12 @@ TEST_F(ChannelTcpTest, BytesPassBothWays) {
 
 TEST_F(ChannelTcpTest, AnOpenedSocketIsTunedAndItsRingsAreEmpty) {
     ASSERT_EQ(0, m_channel.Open("127.0.0.1", m_port));
+    EXPECT_NE(0, fcntl(m_channel.Descriptor(), F_GETFL) & O_NONBLOCK);
+    linger value{};
+    socklen_t size = sizeof(value);
+    ASSERT_EQ(0, getsockopt(m_channel.Descriptor(), SOL_SOCKET, SO_LINGER, &value, &size));
+    EXPECT_EQ(1, value.l_onoff);
+    EXPECT_EQ(1, value.l_linger);
     const UniqueFd first(m_listener.Accept());
     ASSERT_EQ(2, send(first.Get(), "ab", 2, 0));
     char byte = 0;
@@ -203,6 +213,18 @@ TEST_F(ChannelTcpTest, AHostThatDoesNotAnswerIsGivenUpAfterTwentyWaits) {
               m_channel.Connect(descriptor.Get(), "127.0.0.1", full.Port()));
     EXPECT_EQ(3, log.Count("[DBG] select: timeout"));
     EXPECT_TRUE(log.Has("[ERR] Channel timed out during connect (7 seconds), abort anyway"));
+}
+
+TEST_F(ChannelTcpTest, SignalsDoNotProlongTheWaitForAHost) {
+    const FullPort full;
+    m_channel.WaitMilliseconds(50);
+    m_channel.SetTimeout(9);
+    LogCapture log;
+    const SignalStorm storm;
+    EXPECT_EQ(ERR_IO, m_channel.Open("127.0.0.1", full.Port()));
+    EXPECT_FALSE(storm.HasBlownOver());
+    EXPECT_TRUE(log.Has("[DBG] select: EINTR"));
+    EXPECT_EQ(3, log.Count("[DBG] select: timeout"));
 }
 
 TEST_F(ChannelTcpTest, WithoutALimitOnlyTheAbortFlagEndsTheWait) {

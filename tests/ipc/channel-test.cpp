@@ -5,7 +5,6 @@
 #include <gtest/gtest.h>
 #include <signal.h>
 #include <sys/socket.h>
-#include <sys/un.h>
 #include <unistd.h>
 
 #include <array>
@@ -14,9 +13,8 @@
 #include <thread>
 
 #include "ipc/memory-channel.h"
-#include "ipc/simple-ipc.h"
+#include "ipc/signal-storm.h"
 #include "support/log-capture.h"
-#include "support/temp-dir.h"
 #include "utils/error-code.h"
 #include "utils/unique-fd.h"
 
@@ -100,32 +98,6 @@ TEST_F(ChannelTest, OpenOfNoDescriptorIsRefused) {
     EXPECT_TRUE(log.Has("[ERR] setsockopt: Bad file descriptor"));
     EXPECT_TRUE(log.Has("[ERR] Open: SetLinger to socket [-1] failed, Bad file descriptor"));
     EXPECT_EQ(-1, m_channel.SetNonBlock(-1));
-    EXPECT_TRUE(m_channel.IsClosed());
-}
-
-TEST_F(ChannelTest, OpenOfAPathConnectsAsAClient) {
-    UniqueFd unused(m_descriptor);
-    const TempDir dir;
-    IPCListener listener({0, 0});
-    ASSERT_EQ(0, listener.Listen(dir / "s"));
-    ASSERT_EQ(0, m_channel.Open(dir / "s"));
-    const UniqueFd server(listener.Accept());
-    ASSERT_TRUE(server.IsValid());
-    ASSERT_EQ(0, m_channel.WriteU8('y'));
-    ASSERT_EQ(0, m_channel.FlushWrite(0));
-    char byte = 0;
-    EXPECT_EQ(1, read(server.Get(), &byte, 1));
-    EXPECT_EQ('y', byte);
-    EXPECT_EQ(ERR_INVALID_ARGUMENT, m_channel.Open(dir / "s"));
-}
-
-TEST_F(ChannelTest, OpenOfAPathWhereNobodyListensFails) {
-    UniqueFd unused(m_descriptor);
-    const TempDir dir;
-    LogCapture log;
-    EXPECT_EQ(ERR_IO, m_channel.Open(dir / "none"));
-    EXPECT_TRUE(log.Has("[ERR] Channel: Can not connect to server at '" + (dir / "none") +
-                        "'. No such file or directory"));
     EXPECT_TRUE(m_channel.IsClosed());
 }
 
@@ -314,6 +286,27 @@ TEST_F(ChannelTest, ASignalDuringAWaitIsNotAnError) {
     done = true;
     other.join();
     EXPECT_TRUE(log.Has("[DBG] select: EINTR"));
+}
+
+TEST_F(ChannelTest, SignalsDoNotKeepAReadFromTimingOut) {
+    OpenTuned();
+    m_channel.SetTimeout(1);
+    const SignalStorm storm;
+    char byte = 0;
+    EXPECT_EQ(ERR_CONNECTION_TIMEOUT, m_channel.Read(&byte, 1));
+    EXPECT_FALSE(storm.HasBlownOver());
+}
+
+TEST_F(ChannelTest, WithoutRoomForAByteNothingIsReadOrWritten) {
+    Channel channel(0);
+    ASSERT_EQ(0, channel.Open(m_descriptor, true));
+    PeerSends("x");
+    char byte = 0;
+    size_t got = 7;
+    EXPECT_EQ(ERR_INVALID_ARGUMENT, channel.Read(&byte, 1, &got));
+    EXPECT_EQ(0U, got);
+    EXPECT_EQ(0, channel.Read(&byte, 0));
+    EXPECT_EQ(ERR_INVALID_ARGUMENT, channel.Write(&byte, 1));
 }
 
 TEST_F(ChannelTest, DescriptorsAboveTheSetOfSelectAreSafe) {

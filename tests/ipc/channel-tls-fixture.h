@@ -22,6 +22,8 @@ public:
     void WaitMilliseconds(int milliseconds) {
         m_operation_timeout = {milliseconds / 1000, milliseconds % 1000 * 1000};
     }
+    // Once it speaks TLS.
+    [[nodiscard]] SSL* Ssl() const { return static_cast<SSL*>(m_handle); }
 };
 
 class ChannelTlsTest : public testing::Test {
@@ -47,6 +49,11 @@ protected:
     // Connects m_channel with m_peer; the peer plays `side`. No TLS yet.
     void ConnectPeer(TlsPeer::Side side, const TestIdentity& identity = Certificates().server) {
         m_peer.emplace(Connect(m_channel), side, identity);
+    }
+    // From now on the peer speaks this version only.
+    void PeerSpeaks(int version) {
+        ASSERT_EQ(1, SSL_set_min_proto_version(m_peer->Get(), version));
+        ASSERT_EQ(1, SSL_set_max_proto_version(m_peer->Get(), version));
     }
     // Both ends make the handshake, the peer in a thread of its own. Returns the channel's result.
     [[nodiscard]] int Convert(bool server) {

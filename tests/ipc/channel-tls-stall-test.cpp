@@ -1,34 +1,59 @@
-// TLS peers that stall, hang up, or say something wrong, at every step.
+// TLS peers that stall, hang up, or say something wrong, at many places.
 #include <sys/socket.h>
 
 #include <atomic>
 #include <thread>
 
 #include "ipc/channel-tls-fixture.h"
+#include "ipc/signal-storm.h"
 
 namespace {
 
 const char kTimedOut[] = "[ERR] SSLHandshake: timed out during connect (60 seconds), abort anyway";
 
+// A handshake of this version with a peer on this side.
+struct Handshake {
+    int version;
+    TlsPeer::Side side;
+};
+
+constexpr Handshake kHandshakes[] = {
+    {TLS1_2_VERSION, TlsPeer::SERVER},
+    {TLS1_2_VERSION, TlsPeer::CLIENT},
+    {TLS1_3_VERSION, TlsPeer::SERVER},
+    {TLS1_3_VERSION, TlsPeer::CLIENT},
+};
+
+void PrintTo(const Handshake& handshake, std::ostream* out) {
+    *out << (handshake.version == TLS1_2_VERSION ? "TLS 1.2" : "TLS 1.3") << " with a "
+         << (handshake.side == TlsPeer::SERVER ? "server" : "client");
+}
+
+// Bytes between the places where a handshake breaks off.
+constexpr size_t kStep = 61;
+
 class ChannelTlsStallTest : public ChannelTlsTest {
 protected:
-    // Bytes that the peer sends in a whole handshake.
-    [[nodiscard]] size_t HandshakeBytes(TlsPeer::Side side) {
-        ConnectPeer(side);
+    void ConnectPeerOf(const Handshake& handshake) {
+        ConnectPeer(handshake.side);
+        PeerSpeaks(handshake.version);
         SSL_set_num_tickets(m_peer->Get(), 0);  // they come after it
-        EXPECT_EQ(0, Convert(side == TlsPeer::CLIENT));
+    }
+    // Bytes that the peer sends in a whole handshake.
+    [[nodiscard]] size_t HandshakeBytes(const Handshake& handshake) {
+        ConnectPeerOf(handshake);
+        EXPECT_EQ(0, Convert(handshake.side == TlsPeer::CLIENT));
         m_channel.Close();
         return m_peer->Sent() - 8;  // signatures differ in length by some bytes
     }
     // A handshake of which the peer sends so many bytes; then it stalls, or hangs up.
-    [[nodiscard]] int ConvertWithPartOf(TlsPeer::Side side, size_t bytes, bool hangs_up) {
-        ConnectPeer(side);
-        SSL_set_num_tickets(m_peer->Get(), 0);
+    [[nodiscard]] int ConvertWithPartOf(const Handshake& handshake, size_t bytes, bool hangs_up) {
+        ConnectPeerOf(handshake);
         auto peer = std::async(std::launch::async, [this, bytes, hangs_up] {
             m_outcome = m_peer->Handshake(bytes);
             if (hangs_up) shutdown(m_peer->Descriptor(), SHUT_WR);
         });
-        const int result = m_channel.ConvertToSSLChannel(side == TlsPeer::CLIENT);
+        const int result = m_channel.ConvertToSSLChannel(handshake.side == TlsPeer::CLIENT);
         m_channel.Close();
         peer.get();
         return result;
@@ -48,31 +73,43 @@ TEST_F(ChannelTlsStallTest, APeerThatNeverAnswersIsGivenUpAfterTwentyWaits) {
     }
 }
 
-TEST_F(ChannelTlsStallTest, APeerThatStallsAfterAnyByteIsGivenUp) {
-    for (const TlsPeer::Side side : {TlsPeer::SERVER, TlsPeer::CLIENT}) {
-        const size_t whole = HandshakeBytes(side);
-        m_channel.WaitMilliseconds(1);
-        for (size_t bytes = 0; bytes < whole; bytes += 61) {
-            LogCapture log;
-            ASSERT_EQ(ERR_IO, ConvertWithPartOf(side, bytes, false)) << bytes << " of " << whole;
-            EXPECT_TRUE(log.Has(kTimedOut)) << bytes;
-            EXPECT_EQ(TlsPeer::STALLED, m_outcome) << bytes;
-        }
-        m_channel.WaitMilliseconds(1000);
+TEST_F(ChannelTlsStallTest, SignalsDoNotProlongTheWaitForAHandshake) {
+    const UniqueFd silent(Connect(m_channel));
+    m_channel.WaitMilliseconds(50);
+    m_channel.SetTimeout(9);
+    LogCapture log;
+    const SignalStorm storm;
+    EXPECT_EQ(ERR_IO, m_channel.ConvertToSSLChannel(false));
+    EXPECT_FALSE(storm.HasBlownOver());
+    EXPECT_TRUE(log.Has("[DBG] select: EINTR"));
+    EXPECT_EQ(3, log.Count("[DBG] select: timeout"));
+}
+
+class BrokenHandshakeTest : public ChannelTlsStallTest,
+                            public testing::WithParamInterface<Handshake> {};
+
+TEST_P(BrokenHandshakeTest, APeerThatStallsAtAnyStepOf61BytesIsGivenUp) {
+    const size_t whole = HandshakeBytes(GetParam());
+    m_channel.WaitMilliseconds(1);
+    for (size_t bytes = 0; bytes < whole; bytes += kStep) {
+        LogCapture log;
+        ASSERT_EQ(ERR_IO, ConvertWithPartOf(GetParam(), bytes, false)) << bytes << " of " << whole;
+        EXPECT_TRUE(log.Has(kTimedOut)) << bytes;
+        EXPECT_EQ(TlsPeer::STALLED, m_outcome) << bytes;
     }
 }
 
-TEST_F(ChannelTlsStallTest, APeerThatHangsUpAfterAnyByteEndsTheHandshake) {
-    for (const TlsPeer::Side side : {TlsPeer::SERVER, TlsPeer::CLIENT}) {
-        const size_t whole = HandshakeBytes(side);
-        for (size_t bytes = 0; bytes < whole; bytes += 61) {
-            LogCapture log;
-            ASSERT_EQ(ERR_IO, ConvertWithPartOf(side, bytes, true)) << bytes << " of " << whole;
-            EXPECT_FALSE(log.Has(kTimedOut)) << bytes;
-            EXPECT_TRUE(log.Contains("[ERR] SSLHandshake: SSL ")) << bytes;
-        }
+TEST_P(BrokenHandshakeTest, APeerThatHangsUpAtAnyStepOf61BytesEndsTheHandshake) {
+    const size_t whole = HandshakeBytes(GetParam());
+    for (size_t bytes = 0; bytes < whole; bytes += kStep) {
+        LogCapture log;
+        ASSERT_EQ(ERR_IO, ConvertWithPartOf(GetParam(), bytes, true)) << bytes << " of " << whole;
+        EXPECT_FALSE(log.Has(kTimedOut)) << bytes;
+        EXPECT_TRUE(log.Contains("[ERR] SSLHandshake: SSL ")) << bytes;
     }
 }
+
+INSTANTIATE_TEST_SUITE_P(VersionsAndSides, BrokenHandshakeTest, testing::ValuesIn(kHandshakes));
 
 TEST_F(ChannelTlsStallTest, ASignOfLifeBeginsTheCountAnew) {
     ConnectPeer(TlsPeer::CLIENT);
@@ -234,70 +271,6 @@ TEST_F(ChannelTlsStallTest, APeerThatReadsLateGetsEveryByte) {
     is_over = true;
     if (result != 0) m_channel.Close();
     EXPECT_TRUE(sent == peer.get());
-}
-
-TEST_F(ChannelTlsStallTest, APeerThatHangsUpIsAnInputError) {
-    Establish(TlsPeer::SERVER);
-    const std::string record = m_peer->Sealed("abcd");
-    m_peer->SendRaw(record + record.substr(0, 3));
-    m_peer->HangUp();
-    LogCapture log;
-    EXPECT_EQ("abcd", ChannelReceives(10));
-    EXPECT_EQ(ERR_IO, m_result);
-    EXPECT_TRUE(log.Contains("[ERR] read: "));
-    EXPECT_TRUE(log.Has("[ERR] Diagnose: SSL_read failed"));
-    const std::string block(Channel::DEFAULT_CAPACITY, 'b');
-    int result = 0;
-    for (int i = 0; i < 300 && result == 0; ++i)
-        result = m_channel.Write(block.data(), block.size());
-    EXPECT_EQ(ERR_IO, result);
-    EXPECT_TRUE(log.Contains("[ERR] write: "));
-    m_channel.Close();
-    EXPECT_TRUE(m_channel.IsClosed());
-}
-
-TEST_F(ChannelTlsStallTest, APeerThatSaysGoodbyeIsAtAnEnd) {
-    Establish(TlsPeer::SERVER);
-    m_peer->Send("last");
-    m_peer->SendRaw(m_peer->SealedGoodbye());
-    LogCapture log;
-    EXPECT_EQ("last", ChannelReceives(5));
-    EXPECT_EQ(ERR_IO, m_result);
-    EXPECT_TRUE(
-        log.Has("[ERR] Diagnose: select says the socket is readable but actually we can't "
-                "read ... connection closed?"));
-    EXPECT_TRUE(log.Has("[ERR] Diagnose: SSL_read failed"));
-}
-
-TEST_F(ChannelTlsStallTest, BytesThatAreNoRecordAreAnInputError) {
-    Establish(TlsPeer::SERVER);
-    std::string record = m_peer->Sealed("forged");
-    record.back() = static_cast<char>(record.back() ^ 1);
-    m_peer->SendRaw(record);
-    LogCapture log;
-    EXPECT_EQ("", ChannelReceives(6));
-    EXPECT_EQ(ERR_IO, m_result);
-    EXPECT_TRUE(log.Contains("[ERR] ssl-errors: error:"));
-}
-
-TEST_F(ChannelTlsStallTest, AChangeOfKeysIsNotNoticed) {
-    Establish(TlsPeer::SERVER);
-    ASSERT_EQ(1, SSL_key_update(m_peer->Get(), SSL_KEY_UPDATE_REQUESTED));
-    m_peer->Send("new keys");
-    EXPECT_EQ("new keys", ChannelReceives(8));
-    ChannelSends("mine too");
-    EXPECT_EQ("mine too", m_peer->Receive(8));
-}
-
-TEST_F(ChannelTlsStallTest, AReadOfNothingIsRefused) {
-    class Bare : public Channel {
-    public:
-        using Channel::SSLReadFd;
-    };
-    Establish(TlsPeer::SERVER);
-    LogCapture log;
-    EXPECT_EQ(ERR_INVALID_ARGUMENT, Bare::SSLReadFd(nullptr, nullptr, 0, {0, 0}));
-    EXPECT_TRUE(log.Has("[ERR] SSLReadFd: request 0"));
 }
 
 }  // namespace

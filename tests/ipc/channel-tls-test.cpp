@@ -1,12 +1,15 @@
 // Channels that speak TLS: setting up, both ends, verification.
+#include <openssl/conf.h>
 #include <openssl/err.h>
 #include <sys/socket.h>
 
+#include <string_view>
 #include <vector>
 
 #include "ipc/channel-tls-fixture.h"
 #include "ipc/pobject.h"
 #include "ipc/stream.h"
+#include "support/temp-dir.h"
 
 namespace {
 
@@ -96,8 +99,7 @@ TEST_F(ChannelTlsTest, EveryVersionThatTheLibraryStillSpeaksWill) {
     for (const int version : {TLS1_2_VERSION, TLS1_3_VERSION}) {
         for (const TlsPeer::Side side : {TlsPeer::SERVER, TlsPeer::CLIENT}) {
             ConnectPeer(side);
-            ASSERT_EQ(1, SSL_set_max_proto_version(m_peer->Get(), version));
-            ASSERT_EQ(1, SSL_set_min_proto_version(m_peer->Get(), version));
+            PeerSpeaks(version);
             ASSERT_EQ(0, Convert(side == TlsPeer::CLIENT)) << version << " " << side;
             m_peer->Send("told");
             EXPECT_EQ("told", ChannelReceives(4));
@@ -114,6 +116,43 @@ TEST_F(ChannelTlsTest, ACipherThatTheLibraryHasNoMoreIsOnlyWarnedAbout) {
     const bool has_cipher = SSL_CTX_set_cipher_list(context, "RC4-MD5") == 1;
     ERR_clear_error();
     EXPECT_EQ(!has_cipher, log.Has("[WARN] can't set cipher suit to SSL3_TXT_RSA_RC4_128_MD5"));
+}
+
+// What the configuration file of OpenSSL would say, while it lives.
+class OpenSslConfiguration {
+public:
+    explicit OpenSslConfiguration(const std::string& ciphers) {
+        const std::string path = m_dir.Write("openssl.cnf",
+                                             "openssl_conf = main\n"
+                                             "[main]\n"
+                                             "ssl_conf = ssl\n"
+                                             "[ssl]\n"
+                                             "system_default = system\n"
+                                             "[system]\n"
+                                             "CipherString = " +
+                                                 ciphers + "\n");
+        EXPECT_EQ(1, CONF_modules_load_file(path.c_str(), nullptr, 0));
+    }
+    ~OpenSslConfiguration() {
+        CONF_modules_finish();
+        CONF_modules_load_file(nullptr, nullptr, CONF_MFLAGS_IGNORE_MISSING_FILE);
+        ERR_clear_error();
+    }
+    OpenSslConfiguration(const OpenSslConfiguration&) = delete;
+    OpenSslConfiguration& operator=(const OpenSslConfiguration&) = delete;
+
+private:
+    TempDir m_dir;
+};
+
+TEST_F(ChannelTlsTest, TheCiphersThatTheConfigurationFileAllowsStay) {
+    const OpenSslConfiguration configuration("ECDHE-ECDSA-AES256-GCM-SHA384");
+    Establish(TlsPeer::SERVER);
+    std::vector<std::string> older;  // than those of TLS 1.3, which have a list of their own
+    for (int i = 0; const char* name = SSL_get_cipher_list(m_channel.Ssl(), i); ++i) {
+        if (!std::string_view(name).starts_with("TLS_")) older.emplace_back(name);
+    }
+    EXPECT_EQ(std::vector<std::string>{"ECDHE-ECDSA-AES256-GCM-SHA384"}, older);
 }
 
 // --- Verification
@@ -136,6 +175,54 @@ TEST_F(ChannelTlsTest, ACertificateOfAStrangerFailsVerification) {
     EXPECT_EQ(ERR_SSL_VERIFY, Convert(false));
     EXPECT_TRUE(log.Has("[ERR] ConvertToSSLChannel: Verify Fail!"));
     EXPECT_STREQ("SSL certificate verify fail", ErrorText(ERR_SSL_VERIFY));
+}
+
+// --- What was pending
+
+// All that comes until the other end hangs up.
+std::string RawRest(int descriptor) {
+    std::string out;
+    char bytes[4096];
+    for (ssize_t count = 0; (count = recv(descriptor, bytes, sizeof(bytes), 0)) > 0;) {
+        out.append(bytes, static_cast<size_t>(count));
+    }
+    return out;
+}
+
+TEST_F(ChannelTlsTest, WhatIsPendingTravelsInsideTls) {
+    ConnectPeer(TlsPeer::SERVER);
+    ASSERT_EQ(0, m_channel.Write("pending", 7));
+    ASSERT_EQ(0, Convert(false));
+    ASSERT_EQ(0, m_channel.FlushWrite(0));
+    EXPECT_EQ("pending", m_peer->Receive(7));
+}
+
+TEST_F(ChannelTlsTest, WhatIsPendingIsNotSentInClearWhenPreparingFails) {
+    const UniqueFd other(Connect(m_channel));
+    ASSERT_EQ(0, m_channel.Write("a secret", 8));
+    Channel::SetCertificatePaths("", "", Certificates().MissingFile());
+    EXPECT_EQ(ERR_IO, m_channel.ConvertToSSLChannel(false));
+    m_channel.Close();
+    EXPECT_EQ("", RawRest(other.Get()));
+}
+
+TEST_F(ChannelTlsTest, WhatIsPendingIsNotSentInClearWhenTheHandshakeFails) {
+    const UniqueFd other(Connect(m_channel));
+    m_channel.WaitMilliseconds(1);
+    ASSERT_EQ(0, m_channel.Write("a secret", 8));
+    EXPECT_EQ(ERR_IO, m_channel.ConvertToSSLChannel(false));
+    m_channel.Close();
+    const std::string hello = RawRest(other.Get());
+    EXPECT_NE("", hello);
+    EXPECT_EQ(std::string::npos, hello.find("a secret"));
+}
+
+TEST_F(ChannelTlsTest, WhatIsPendingIsNotSentInClearWhenVerificationFails) {
+    ConnectPeer(TlsPeer::SERVER, Certificates().stranger);
+    m_channel.SkipVerification(false);
+    ASSERT_EQ(0, m_channel.Write("a secret", 8));
+    EXPECT_EQ(ERR_SSL_VERIFY, Convert(false));  // and closes
+    EXPECT_EQ(std::string::npos, RawRest(m_peer->Descriptor()).find("a secret"));
 }
 
 // --- Files

@@ -251,6 +251,18 @@ TEST_F(IPCSenderTest, NothingIsReadWhenSendingFails) {
     EXPECT_EQ(0, m_sender.Recv(m_value));  // it is still there
 }
 
+TEST_F(IPCSenderTest, HalfARequestIsNotSentWhenTheConnectionIsClosed) {
+    ASSERT_EQ(0, m_sender.Connect(m_path));
+    const UniqueFd server(m_listener.Accept());
+    PObject request;
+    request["a"] = "goes into the ring";
+    request["b"] = PObject::buffer_type();  // can not be sent
+    EXPECT_EQ(-1, m_sender.Send(request));
+    m_sender.Close();
+    char bytes[64];
+    EXPECT_EQ(0, recv(server.Get(), bytes, sizeof(bytes), 0));
+}
+
 TEST_F(IPCSenderTest, ASecondConnectIsRefusedUntilTheFirstIsClosed) {
     ASSERT_EQ(0, m_sender.Connect(m_path));
     EXPECT_EQ(-1, m_sender.Connect(m_path));

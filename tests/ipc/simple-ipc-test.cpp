@@ -85,10 +85,12 @@ TEST_F(IPCListenerTest, AFolderThatIsMissingFailsTheBind) {
     EXPECT_EQ(0, m_listener.Listen(m_path));
 }
 
-TEST_F(IPCListenerTest, APathTooLongForAnAddressFailsTheBind) {
+TEST_F(IPCListenerTest, APathTooLongForAnAddressFailsTheBindAndItsFileStays) {
+    const std::string path = m_dir.Write(std::string(108, 'x'), "somebody's");
     LogCapture log;
-    EXPECT_EQ(-1, m_listener.Listen(m_dir / std::string(108, 'x')));
+    EXPECT_EQ(-1, m_listener.Listen(path));
     EXPECT_TRUE(log.Has("[ERR] bind: File name too long (36)"));
+    EXPECT_EQ("somebody's", ReadWholeFile(path));
 }
 
 }  // namespace

@@ -35,6 +35,10 @@ public:
     [[nodiscard]] std::string SealedGoodbye();
     void SendRaw(const std::string& bytes) const;
     void Send(const std::string& text) { SendRaw(Sealed(text)); }
+    // What OpenSSL has put out since, for a test that has called it itself: not sent yet.
+    [[nodiscard]] std::string TakeOutgoing();
+    // Hands bytes of the socket to OpenSSL; false at its end.
+    [[nodiscard]] bool Feed();
     // So many bytes of text, or what came until the other end hung up or said goodbye.
     [[nodiscard]] std::string Receive(size_t length);
     // Whether the other end has said goodbye.
@@ -45,10 +49,6 @@ public:
     [[nodiscard]] size_t Sent() const { return m_sent; }
 
 private:
-    [[nodiscard]] std::string TakeOutgoing();
-    // Hands bytes of the socket to OpenSSL; false at its end.
-    [[nodiscard]] bool Feed();
-
     UniqueFd m_descriptor;
     std::unique_ptr<SSL_CTX, FreeWith<SSL_CTX_free>> m_context;
     std::unique_ptr<SSL, FreeWith<SSL_free>> m_ssl;
