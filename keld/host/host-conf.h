@@ -14,6 +14,8 @@ namespace keld_host {
 
 struct VolumeConf {
     bool internal = true;
+
+    bool operator==(const VolumeConf&) const = default;
 };
 
 struct ShareConf {
@@ -21,6 +23,8 @@ struct ShareConf {
     bool recycleBin = false;
     bool recycleBinAdminOnly = false;
     bool mountPoint = false;
+
+    bool operator==(const ShareConf&) const = default;
 };
 
 struct HostConf {
@@ -33,6 +37,8 @@ struct HostConf {
     std::string speaker;                        // empty: none
     std::string notifyFolder;
     std::string indexFolder;
+
+    bool operator==(const HostConf&) const = default;
 };
 
 // Where a text breaks the format, and why.

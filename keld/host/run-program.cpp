@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <poll.h>
 #include <signal.h>
+#include <sys/prctl.h>
 #include <sys/stat.h>
 #include <sys/syscall.h>
 #include <sys/wait.h>
@@ -41,6 +42,13 @@ public:
         }
         m_arguments.push_back(nullptr);
         m_environment.push_back(nullptr);
+    }
+
+    // Once the caller has gone nobody would keep the program to its time, and its work would go on
+    // behind the back of whoever tries the same again.
+    static void EndWith(pid_t caller) {
+        prctl(PR_SET_PDEATHSIG, SIGKILL);
+        if (getppid() != caller) _exit(127);
     }
 
     // Does not return: the process is the program afterwards, or ends.
@@ -168,9 +176,13 @@ int RunProgram(const Program& program, int limitMs) {
     if (pipe2(fds, O_CLOEXEC) != 0) return -1;
     const UniqueFd reader(fds[0]);
     UniqueFd writer(fds[1]);
+    const pid_t caller = getpid();
     const pid_t pid = fork();
     if (pid < 0) return -1;
-    if (pid == 0) prepared.Become(writer.Get());
+    if (pid == 0) {
+        Prepared::EndWith(caller);
+        prepared.Become(writer.Get());
+    }
     writer.Reset();
     const int error = ReadReport(reader.Get(), killAt);
     int status = 0;

@@ -19,8 +19,10 @@ struct Program {
     std::vector<std::pair<std::string, std::string>> environment;
 };
 
-// Runs and waits. Returns the exit status, 0 to 255; or negative with errno: ETIMEDOUT when it was
-// killed for its time, ECANCELED when a signal ended it, else why it could not be started.
+// Runs and waits. The program is killed when the thread that waits for it ends, as the thread of a
+// killed process does; what it has left in the background is not. Returns the exit status, 0 to
+// 255; or negative with errno: ETIMEDOUT when it was killed for its time, ECANCELED when a signal
+// ended it, else why it could not be started.
 [[nodiscard]] int RunProgram(const Program& program, int limitMs = RUN_LIMIT_MS);
 
 // Starts and does not wait. The program is a child of init. Returns 0, or negative with errno.

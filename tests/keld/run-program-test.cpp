@@ -5,6 +5,7 @@
 #include <keld/exec.h>
 #include <signal.h>
 #include <sys/stat.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -40,6 +41,20 @@ protected:
     bool Appears(const std::string& name) const {
         for (int i = 0; i < 1000; ++i) {
             if (access((m_dir / name).c_str(), F_OK) == 0) return true;
+            std::this_thread::sleep_for(std::chrono::milliseconds(10));
+        }
+        return false;
+    }
+    // Waits for the end of a process that is init's, which takes it in some time.
+    static bool Ends(pid_t pid) {
+        const std::string stat = "/proc/" + std::to_string(pid) + "/stat";
+        for (int i = 0; i < 500; ++i) {
+            const UniqueFd fd(open(stat.c_str(), O_RDONLY | O_CLOEXEC));
+            char buffer[256] = "";
+            if (!fd.IsValid() || read(fd.Get(), buffer, sizeof(buffer) - 1) <= 0 ||
+                std::string(buffer).find(") Z ") != std::string::npos) {
+                return true;
+            }
             std::this_thread::sleep_for(std::chrono::milliseconds(10));
         }
         return false;
@@ -91,17 +106,34 @@ TEST_F(RunProgramTest, AProgramThatTakesTooLongIsKilledWithItsChildren) {
     ASSERT_TRUE(Appears("child"));
     const pid_t child = atoi(ReadWholeFile(m_dir / "child").c_str());
     ASSERT_LT(1, child);
-    // The child is init's now, which takes it in some time.
-    bool isGone = false;
-    for (int i = 0; i < 500 && !isGone; ++i) {
-        const std::string stat = "/proc/" + std::to_string(child) + "/stat";
-        const UniqueFd fd(open(stat.c_str(), O_RDONLY | O_CLOEXEC));
-        char buffer[256] = "";
-        isGone = !fd.IsValid() || read(fd.Get(), buffer, sizeof(buffer) - 1) <= 0 ||
-                 std::string(buffer).find(") Z ") != std::string::npos;
-        if (!isGone) std::this_thread::sleep_for(std::chrono::milliseconds(10));
-    }
-    EXPECT_TRUE(isGone);
+    EXPECT_TRUE(Ends(child));
+}
+
+TEST_F(RunProgramTest, AProgramThatIsWaitedForEndsWithItsCaller) {
+    const std::string script =
+        Script("s", "echo $$ > DIR/tmp; mv DIR/tmp DIR/pid; trap '' TERM INT HUP; exec sleep 1000");
+    const pid_t caller = fork();
+    if (caller == 0) _exit(RunProgram({script, {}, {}}, 1000000) == 0 ? 0 : 1);
+    ASSERT_TRUE(Appears("pid"));
+    const pid_t program = atoi(ReadWholeFile(m_dir / "pid").c_str());
+    ASSERT_LT(1, program);
+    ASSERT_EQ(0, kill(program, 0));
+    kill(caller, SIGKILL);
+    ASSERT_EQ(caller, waitpid(caller, nullptr, 0));
+    EXPECT_TRUE(Ends(program));
+    kill(program, SIGKILL);
+}
+
+TEST_F(RunProgramTest, AProgramInTheBackgroundOutlivesItsCaller) {
+    const std::string script =
+        Script("s", "while ! [ -e DIR/go ]; do sleep 0.01; done; echo > DIR/done");
+    const pid_t caller = fork();
+    if (caller == 0) _exit(StartProgram({script, {}, {}}) == 0 ? 0 : 1);
+    int status = -1;
+    ASSERT_EQ(caller, waitpid(caller, &status, 0));
+    EXPECT_EQ(0, status);
+    m_dir.Write("go", "");
+    EXPECT_TRUE(Appears("done"));
 }
 
 TEST_F(RunProgramTest, AProgramThatLeavesOneInTheBackgroundIsNotWaitedFor) {

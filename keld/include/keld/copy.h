@@ -42,6 +42,7 @@ typedef int (*KELDCopyIsCancel)(void* user_data);
 int KELDCopyTHRSetCallbackIsCancel(KELDCopyTHRArgs* args, KELDCopyIsCancel callback,
                                    void* user_data);
 
+/* clang-format off */
 /* Copies the regular file `from` to the path `to`, whose folder must exist. Both are absolute; they
  * may be longer than PATH_MAX below the root of a share or a device. `args` may be null.
  *
@@ -58,16 +59,19 @@ int KELDCopyTHRSetCallbackIsCancel(KELDCopyTHRArgs* args, KELDCopyIsCancel callb
  * Returns 0; negative on failure, with these values of KLIBCErrGet:
  *   KELDERR_SRC_MISS_PATH       there is no source
  *   KELDERR_INVALID_ARGUMENT    the source is no regular file (a link, a folder, a FIFO), a link
- * stands on the way to it, or a path is null or empty KELDERR_DST_TYPE_CONFLICT   `to` exists and
- * is no regular file; asked before the next KELDERR_DST_EXISTS          `to` exists and may not be
- * replaced KELDERR_CANCELLED           the callback asked for it KELDERR_NO_SPACE,
- * KELDERR_QUOTA_FULL KELDERR_NO_PERMISSION       also a read-only file system
+ *                               stands on the way to it, or a path is null or empty
+ *   KELDERR_DST_TYPE_CONFLICT   `to` exists and is no regular file; asked before the next
+ *   KELDERR_DST_EXISTS          `to` exists and may not be replaced
+ *   KELDERR_CANCELLED           the callback asked for it
+ *   KELDERR_NO_SPACE, KELDERR_QUOTA_FULL
+ *   KELDERR_NO_PERMISSION       also a read-only file system
  *   KELDERR_FILE_TOO_LARGE      the destination's file system takes no file of this size
  *   KELDERR_NAME_NOT_SUPPORTED, KELDERR_NAME_TOO_LONG   it does not take the name
  *   KELDERR_IO                  also a device that is gone
  *   KELDERR_SYSTEM              no memory or no descriptors
  *   KELDERR_FILE_OPERATION      anything else: no folder to copy into, a symbolic link on the way
  *                               there, a source that changed meanwhile */
+/* clang-format on */
 int KELDFileCopy_r(const char* from, const char* to, const KELDCopyOptions* options,
                    KELDCopyTHRArgs* args);
 

@@ -71,6 +71,7 @@ int KELDSchedCTaskGetApp(char* buffer, size_t size, const KELDSchedTask* entry);
 /* 1 or 0. */
 int KELDSchedTaskIsListable(const KELDSchedTask* entry);
 
+/* clang-format off */
 /* Takes the timetable out of `json` (UTF-8), an object with the member "schedule", itself an
  * object. All its members are optional; null counts as not given, and members not named here are
  * passed over.
@@ -79,19 +80,25 @@ int KELDSchedTaskIsListable(const KELDSchedTask* entry);
  *   "min"             0 to 59, default 0
  *   "date_type"       0 on days of the week (default), 1 on a date
  *   "week_name"       with date_type 0: the days, "0" Sunday to "6" Saturday, with commas between,
- * as in "1,2,5"; default "", which is every day "date"            with date_type 1: "YYYY/M/D",
- * years 1970 to 9999; has to be given then "repeat"          with date_type 1: how it goes on from
- * that date: 0            once (default) -1 or 1001   every day 1002         every week, on the
- * date's day of the week 1, 2, 3, 4, 6   after so many months, on the date's day of the month 12
- * every year A month without that day (the 31st, 29 February) is passed over. With date_type 0 it
- * has no meaning, but must be one of these "repeat_hour"     again after so many hours on the same
- * day, 0 to 23, default 0 "repeat_min"      and so many minutes, 0 to 59, default 0; both 0 is once
- * on that day "last_work_hour"  the last hour of the day in which a repeat may begin, "hour" to 23
- * (0 to 23 without repeats), default 23
+ *                     as in "1,2,5"; default "", which is every day
+ *   "date"            with date_type 1: "YYYY/M/D", years 1970 to 9999; has to be given then
+ *   "repeat"          with date_type 1: how it goes on from that date:
+ *                         0              once (default)
+ *                         -1 or 1001     every day
+ *                         1002           every week, on the date's day of the week
+ *                         1, 2, 3, 4, 6  after so many months, on the date's day of the month
+ *                         12             every year
+ *                     A month without that day (the 31st, 29 February) is passed over. With
+ *                     date_type 0 it has no meaning, but must be one of these
+ *   "repeat_hour"     again after so many hours on the same day, 0 to 23, default 0
+ *   "repeat_min"      and so many minutes, 0 to 59, default 0; both 0 is once on that day
+ *   "last_work_hour"  the last hour of the day in which a repeat may begin, "hour" to 23 (0 to 23
+ *                     without repeats), default 23
  *
  * Numbers are integers. An object without any of these members takes the timetable away: the entry
  * is kept, and never runs. Returns false, the entry unchanged, for a text that is no such object, a
  * member of another type or a value out of its range. */
+/* clang-format on */
 bool KELDSchedTaskConvertFromJson_Schedule(const char* json, KELDSchedTask* entry);
 
 #ifdef __cplusplus
