@@ -7,7 +7,9 @@
 #include "daemon/share-tasks.h"
 #include "db/task-db.h"
 #include "ipc/pobject.h"
+#include "platform/task-utils.h"
 #include "processor/task-entry-handler.h"
+#include "utils/confined-path.h"
 #include "utils/log.h"
 
 namespace {
@@ -16,6 +18,20 @@ namespace {
 std::string NameBeforeChange(const PObject& request) {
     const bool is_path_change = RequestText(request, "type") == "pre_path_change";
     return RequestText(request, is_path_change ? "origin_share_name" : "share_name");
+}
+
+// The place of the share that the entry was built for.
+std::string SharePath(const TaskRunInfo& entry) {
+    const auto& root = entry.is_export ? entry.src_root : entry.dst_root;
+    return root == nullptr ? "" : root->Path();
+}
+
+// A share that has no place now is taken to be where it was.
+bool IsForAnotherPlace(const TaskRunInfo& entry, const TaskInfo& task) {
+    if (entry.hub_share_name != task.hub_share_name) return true;
+    std::string share_path;
+    return GetHubDirFullPath(task.hub_share_name, "/", share_path) == 0 &&
+           share_path != SharePath(entry);
 }
 
 }  // namespace
@@ -54,18 +70,18 @@ int Ferrixd::HandleSharePathChange(const PObject& request) {
     if (tasks.empty()) return 0;
     SLOG_INFO("HandleSharePathChange: origin_share_name = %s, share_name = %s\n",
               origin_share_name.c_str(), share_name.c_str());
-    DropRenamedEntries(tasks);
+    DropMovedEntries(tasks);
     LoadUSBTaskEntries();
     return 0;
 }
 
-// A device that was plugged in while its share was on its way has entries of the old name, which
-// would be kept: the task would wait for that name, or copy into whatever share bears it next.
-void Ferrixd::DropRenamedEntries(const std::list<TaskInfo>& tasks) {
+// A device that was plugged in while its share was on its way has entries of the old name or place,
+// which would be kept: the task would wait for that, or copy into whatever is there next.
+void Ferrixd::DropMovedEntries(const std::list<TaskInfo>& tasks) {
     for (const TaskInfo& task : tasks) {
         TaskRunInfo entry;
         if (TaskEntryHandler::GetInstance().GetTaskEntry(task.id, entry) < 0 ||
-            entry.hub_share_name == task.hub_share_name) {
+            !IsForAnotherPlace(entry, task)) {
             continue;
         }
         SLOG_NOTICE("Task '%llu' was loaded for share '%s', it is loaded anew\n", Llu(task.id),
@@ -86,6 +102,7 @@ int Ferrixd::HandleShareReloadEntry(const PObject& request) {
     if (ListTasksOfShare(share_name, tasks) < 0) return -1;
     if (tasks.empty()) return 0;
     SLOG_INFO("HandleShareReloadEntry: share_name = %s\n", share_name.c_str());
+    DropMovedEntries(tasks);
     LoadUSBTaskEntries();
     return 0;
 }

@@ -11,6 +11,7 @@
 #include "processor/file-processor.h"
 #include "processor/task-entry-handler.h"
 #include "processor/task-event-manager.h"
+#include "strategy/run-progress.h"
 #include "utils/log.h"
 
 namespace {
@@ -156,5 +157,16 @@ int Ferrixd::ListTask(const PObject&, PObject& response) {
 int Ferrixd::ListEntry(const PObject&, PObject&) {
     LogDump(TaskEntryHandler::GetInstance().ToString());
     USBMatcher::GetInstance().Dump();
+    return 0;
+}
+
+// About the run in hand, or the last one: only one task runs at a time.
+int Ferrixd::GetTaskProgress(const PObject&, PObject& response) {
+    const RunProgress::Snapshot progress = RunProgress::GetInstance().Get();
+    response["run"] = progress.run;
+    response["task_id"] = progress.task_id;
+    response["start_time"] = progress.start_time;
+    response["files"] = progress.files;
+    response["bytes"] = progress.bytes;
     return 0;
 }

@@ -7,6 +7,7 @@
 #include "daemon/request-text.h"
 #include "daemon/task-folder.h"
 #include "daemon/usb-matcher.h"
+#include "db/side-files.h"
 #include "db/task-db.h"
 #include "ipc/pobject.h"
 #include "platform/schedule.h"
@@ -145,8 +146,11 @@ int Ferrixd::ScheduleTask(const PObject& request, TaskInfo& task_info, PObject& 
     return 0;
 }
 
+// Where a repository has lost its task database, numbers are given again and folders are still
+// there. A new task would take what the old one had copied for its own and leave it out. What says
+// that a copy is not to be trusted, in the other files, holds for any task and stays.
 int Ferrixd::InitTaskEnv(uint64_t task_id) {
-    if (MakeTaskFolder(task_id) == 0) return 0;
+    if (MakeTaskFolder(task_id) == 0 && RemoveDatabase(FileDBPath(task_id)) == 0) return 0;
     SLOG_ERR("Failed to create task folder '%s'\n", TaskFolderPath(task_id).c_str());
     return -1;
 }

@@ -22,6 +22,7 @@ Ferrixd::Ferrixd() {
         {"disable_task",             &Ferrixd::DisableDefaultTask   },
         {"list_task",                &Ferrixd::ListTask             },
         {"list_entry",               &Ferrixd::ListEntry            },
+        {"get_task_progress",        &Ferrixd::GetTaskProgress      },
         {"set_global_setting",       &Ferrixd::SetGlobalSetting     },
     };
     m_hooks = {

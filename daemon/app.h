@@ -110,6 +110,7 @@ private:
     int RemoveTask(const PObject& request, PObject& response);
     int ListTask(const PObject& request, PObject& response);
     int ListEntry(const PObject& request, PObject& response);
+    int GetTaskProgress(const PObject& request, PObject& response);
     // `file_processor` may be null. Returns 0, or -1 with the error set when the device has no row.
     int GetTaskResponse(const TaskInfo& task_info, FileProcessor* file_processor,
                         PObject& response);
@@ -185,8 +186,9 @@ private:
     int HandleShareRemoveEntry(const PObject& request);
     int HandleSharePathChange(const PObject& request);
     int HandleShareReloadEntry(const PObject& request);
-    // Drops the entries that were loaded for another share than their rows name now.
-    void DropRenamedEntries(const std::list<TaskInfo>& tasks);
+    // Drops the entries that were loaded for another share than their rows name now, or for another
+    // place of it.
+    void DropMovedEntries(const std::list<TaskInfo>& tasks);
 
     // --- Shares that are deleted: app-share-delete.cpp
     int HandleShareDelete(const PObject& request);

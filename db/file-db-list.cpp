@@ -50,7 +50,7 @@ int FileDB::GetFileListBySourcePath(const std::string& path, bool recursive, Fil
     const size_t cut = path == "/" ? 0 : prefix.size();
     const std::string end = EndOfPrefix(prefix);
     const DbLock lock(m_mutex);
-    if (m_state == nullptr) return -1;
+    if (m_state == nullptr || m_state->ForgetIfOwed() < 0) return -1;
     SqlQuery& query = m_state->rows_in_range;
     const StatementUse use(query);
     std::string start = prefix;

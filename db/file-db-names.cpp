@@ -24,6 +24,16 @@ std::string TailOf(const std::string& extension) {
     return extension.empty() ? ")" : ")." + extension;
 }
 
+int AddMoved(FileDBState& state, const FileInfo& info) {
+    if (state.RemoveRows(info.source_path) < 0) return -1;
+    SqlQuery& query = state.add_moved;
+    query.Bind(1, info.source_path);
+    query.Bind(2, info.destination_path);
+    query.Bind(3, static_cast<int64_t>(info.size));
+    query.Bind(4, int64_t{info.mtime});
+    return query.Execute();
+}
+
 // The number of a name that NumberedPath() would give, 0 for any other.
 uint64_t NumberOf(const std::string& path, size_t start, const std::string& tail) {
     uint64_t number = 0;
@@ -90,18 +100,16 @@ std::string FileDB::NumberedPath(const std::string& stem, const std::string& ext
 
 int FileDB::AddMovedFile(const FileInfo& info) {
     const DbLock lock(m_mutex);
-    if (m_state == nullptr || m_state->EndBatch() < 0) return -1;
-    SqlQuery& query = m_state->add_moved;
-    query.Bind(1, info.source_path);
-    query.Bind(2, info.destination_path);
-    query.Bind(3, static_cast<int64_t>(info.size));
-    query.Bind(4, int64_t{info.mtime});
-    return query.Execute();
+    if (m_state == nullptr) return -1;
+    m_state->has_moved_files = true;
+    const int result = m_state->BeginDurable() < 0 ? -1 : AddMoved(*m_state, info);
+    return m_state->EndDurable(result);
 }
 
 int FileDB::GetMovedFile(FileInfo& info) {
     const DbLock lock(m_mutex);
     if (m_state == nullptr) return -1;
+    if (!m_state->has_moved_files) return 0;
     SqlQuery& query = m_state->get_moved;
     const StatementUse use(query);
     query.Bind(1, info.source_path);
@@ -116,7 +124,9 @@ int FileDB::ForgetMovedFiles() {
     const DbLock lock(m_mutex);
     if (m_state == nullptr || m_state->EndBatch() < 0) return -1;
     m_state->free_numbers.clear();
-    return ExecSql(m_state->db, "DELETE FROM moved_table;");
+    const int result = ExecSql(m_state->db, "DELETE FROM moved_table;");
+    if (result == 0) m_state->has_moved_files = false;
+    return result;
 }
 
 int FileDB::IsDestinationTaken(const std::string& path) {

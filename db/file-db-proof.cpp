@@ -30,16 +30,16 @@ int Doubt(FileDBState& state, const std::string& source_path) {
 
 int FileDB::DoubtFileInfo(const std::string& source_path) {
     const DbLock lock(m_mutex);
-    if (m_state == nullptr || m_state->EndBatch() < 0) return -1;
-    // On the disk before the file is touched: the only write here that is waited for.
-    if (ExecSql(m_state->db, "PRAGMA synchronous = FULL;") < 0) return -1;
-    const int result = m_state->Begin() < 0 ? -1 : m_state->End(Doubt(*m_state, source_path));
-    return ExecSql(m_state->db, "PRAGMA synchronous = NORMAL;") < 0 ? -1 : result;
+    if (m_state == nullptr) return -1;
+    // Before the file is touched.
+    const int result = m_state->BeginDurable() < 0 ? -1 : Doubt(*m_state, source_path);
+    return m_state->EndDurable(result);
 }
 
 int FileDB::GetUnprovenMark(int64_t& mark) {
     const DbLock lock(m_mutex);
-    if (m_state == nullptr || m_state->EndBatch() < 0) return -1;
+    if (m_state == nullptr || m_state->ForgetIfOwed() < 0) return -1;
+    static_cast<void>(m_state->EndBatch());  // TakeRowLoss() tells; the other rows can be proven
     mark = 0;
     {
         const StatementUse use(m_state->unproven_mark);
@@ -52,26 +52,27 @@ int FileDB::GetUnprovenMark(int64_t& mark) {
 
 int FileDB::ProveFileInfo(int64_t mark) {
     const DbLock lock(m_mutex);
-    if (m_state == nullptr || m_state->EndBatch() < 0) return -1;
+    if (m_state == nullptr || m_state->ForgetIfOwed() < 0 || m_state->EndBatch() < 0) return -1;
     m_state->prove.Bind(1, mark);
     return m_state->prove.Execute() < 0 ? -1 : CountUnproven(*m_state);
 }
 
 int FileDB::ForgetUnproven() {
     const DbLock lock(m_mutex);
-    if (m_state == nullptr || m_state->Begin() < 0) return -1;
-    m_state->free_numbers.clear();
+    if (m_state == nullptr) return -1;
     m_state->has_flush_failed = true;
-    const int result = m_state->End(
-        ExecSql(m_state->db,
-                "DELETE FROM file_info_table WHERE id IN ( SELECT id FROM unproven_table );"
-                "DELETE FROM unproven_table;"));
-    return result < 0 ? -1 : CountUnproven(*m_state);
+    m_state->must_forget = true;  // stays until it is done: a later good flush says nothing
+    return m_state->ForgetIfOwed();
 }
 
 bool FileDB::TakeFlushFailure() {
     const DbLock lock(m_mutex);
     return m_state != nullptr && std::exchange(m_state->has_flush_failed, false);
+}
+
+bool FileDB::TakeRowLoss() {
+    const DbLock lock(m_mutex);
+    return m_state != nullptr && std::exchange(m_state->has_lost_rows, false);
 }
 
 uint64_t FileDB::UnprovenCount() {

@@ -2,6 +2,8 @@
 
 #include <sqlite3.h>
 
+#include "utils/path-util.h"
+
 // Every object is made and every row inserted only if it is not there yet. The tables from
 // unproven_table on are ours alone: a program that does not know them does no harm, because the
 // triggers belong to the file.
@@ -9,7 +11,8 @@
 // The triggers delete before they insert: within "INSERT OR IGNORE" a conflict in a trigger is
 // ignored, too, and the row would keep the number of an old flush. They are kept cheap: each page
 // that a small transaction touches is written whole. So is the log's checkpoint rare, which flushes
-// twice.
+// twice. A folder that was not made has nothing to prove. A trigger that is changed gets a new
+// name: files have the old one.
 const char FILE_DB_SCHEMA[] =
     "PRAGMA journal_mode = WAL;PRAGMA synchronous = NORMAL;PRAGMA wal_autocheckpoint = 4000;"
     "BEGIN IMMEDIATE;"
@@ -34,14 +37,16 @@ const char FILE_DB_SCHEMA[] =
     " id INTEGER PRIMARY KEY,"
     " flush INTEGER NOT NULL );"
     "INSERT or IGNORE into flush_table VALUES (1, 1);"
-    "CREATE TRIGGER IF NOT EXISTS file_info_insert_trigger AFTER INSERT ON file_info_table"
-    " WHEN NEW.file_type = 0 BEGIN"
+    "DROP TRIGGER IF EXISTS file_info_insert_trigger;"
+    "DROP TRIGGER IF EXISTS file_info_update_trigger;"
+    "CREATE TRIGGER IF NOT EXISTS file_info_added_trigger AFTER INSERT ON file_info_table BEGIN"
     "  DELETE FROM unproven_table WHERE id = NEW.id;"
-    "  INSERT INTO unproven_table SELECT NEW.id, flush FROM flush_table; END;"
-    "CREATE TRIGGER IF NOT EXISTS file_info_update_trigger AFTER UPDATE ON file_info_table"
-    " WHEN NEW.file_type = 0 BEGIN"
+    "  INSERT INTO unproven_table SELECT NEW.id, flush FROM flush_table"
+    "   WHERE NEW.file_type = 0 OR NEW.destination_path <> ''; END;"
+    "CREATE TRIGGER IF NOT EXISTS file_info_changed_trigger AFTER UPDATE ON file_info_table BEGIN"
     "  DELETE FROM unproven_table WHERE id = NEW.id;"
-    "  INSERT INTO unproven_table SELECT NEW.id, flush FROM flush_table; END;"
+    "  INSERT INTO unproven_table SELECT NEW.id, flush FROM flush_table"
+    "   WHERE NEW.file_type = 0 OR NEW.destination_path <> ''; END;"
     "DELETE FROM file_info_table WHERE id IN ( SELECT id FROM unproven_table );"
     "DELETE FROM unproven_table;"
 
@@ -69,6 +74,8 @@ struct StatementRow {
 
 // "GLOB 'prefix*'" is asked as a range: it is an index's work, holds for bytes that are no UTF-8,
 // which GLOB takes for one another, and knows no limit of length.
+// No flush has the greatest number, and none proves a doubted row: its file may be gone by now.
+// Only a row that is written anew speaks of the next one.
 constexpr StatementRow kStatements[] = {
     {&FileDBState::begin,              "BEGIN TRANSACTION;"                            },
     {&FileDBState::end,                "END TRANSACTION;"                              },
@@ -104,13 +111,14 @@ constexpr StatementRow kStatements[] = {
      "?1 "
      ");"                                                                              },
     {&FileDBState::doubt_add,
-     "INSERT INTO unproven_table SELECT f.id, b.flush FROM file_info_table f, flush_table "
-     "b "
-     "WHERE f.source_path = ?1;"                                                       },
+     "INSERT INTO unproven_table SELECT id, 9223372036854775807 FROM file_info_table WHERE "
+     "source_path = ?1;"                                                               },
     {&FileDBState::unproven_mark,
-     "SELECT flush FROM flush_table WHERE EXISTS ( SELECT 1 FROM unproven_table );"    },
+     "SELECT flush FROM flush_table WHERE EXISTS ( SELECT 1 FROM unproven_table WHERE flush < "
+     "9223372036854775807 );"                                                          },
     {&FileDBState::prove,              "DELETE FROM unproven_table WHERE flush <= ?1;" },
-    {&FileDBState::unproven_count,     "SELECT COUNT(*) FROM unproven_table;"          },
+    {&FileDBState::unproven_count,
+     "SELECT COUNT(*) FROM unproven_table WHERE flush < 9223372036854775807;"          },
 };
 
 }  // namespace
@@ -119,6 +127,10 @@ int FileDBState::Prepare() {
     for (const StatementRow& row : kStatements) {
         if ((this->*row.statement).Prepare(db, row.sql) < 0) return -1;
     }
+    SqlQuery any_moved;
+    if (any_moved.Prepare(db, "SELECT EXISTS ( SELECT 1 FROM moved_table );") < 0) return -1;
+    if (any_moved.Step() != 1) return -1;
+    has_moved_files = any_moved.Bool(0);
     return 0;
 }
 
@@ -126,17 +138,28 @@ int FileDBState::Begin() { return EndBatch() < 0 ? -1 : begin.Execute(); }
 
 int FileDBState::End(int result) {
     if (result == 0) result = end.Execute();
+    if (result == 0) return 0;
     // Also after a failed end: the next operation shall not find itself inside this one.
-    if (result < 0 && sqlite3_get_autocommit(db) == 0) {
-        static_cast<void>(ExecSql(db, "ROLLBACK;"));
-    }
+    if (sqlite3_get_autocommit(db) == 0) static_cast<void>(ExecSql(db, "ROLLBACK;"));
+    free_numbers.clear();  // the names of rows that are gone
     return result;
 }
 
+int FileDBState::BeginDurable() {
+    if (EndBatch() < 0 || ExecSql(db, "PRAGMA synchronous = FULL;") < 0) return -1;
+    return begin.Execute();
+}
+
+int FileDBState::EndDurable(int result) {
+    result = End(result);
+    return ExecSql(db, "PRAGMA synchronous = NORMAL;") < 0 ? -1 : result;
+}
+
 int FileDBState::BeginInBatch() {
-    // A full disk ends a transaction by itself.
-    if (batch_rows > 0 && sqlite3_get_autocommit(db) == 0) return 0;
-    batch_rows = 0;
+    if (batch_rows > 0) {
+        if (sqlite3_get_autocommit(db) == 0) return 0;
+        static_cast<void>(EndBatch());  // a full disk has ended it by itself
+    }
     if (begin.Execute() < 0) return -1;
     batch_rows = 1;
     return 0;
@@ -146,14 +169,42 @@ int FileDBState::EndInBatch(int result) {
     if (result == 0 && batch_rows++ < kBatchRows) return 0;
     batch_rows = 0;
     result = End(result);
-    if (result < 0) free_numbers.clear();  // the names of rows that are gone
+    if (result < 0) has_lost_rows = true;
     return result;
 }
 
 int FileDBState::EndBatch() {
     if (batch_rows == 0) return 0;
     batch_rows = 0;
-    return sqlite3_get_autocommit(db) != 0 ? 0 : End(0);
+    const bool is_open = sqlite3_get_autocommit(db) == 0;
+    if (End(is_open ? 0 : -1) == 0) return 0;
+    has_lost_rows = true;
+    return -1;
+}
+
+int FileDBState::RemoveRows(const std::string& path) {
+    const std::string below = PathAddTrailingSlash(path);
+    const std::string beyond = EndOfPrefix(below);
+    remove_rows.Bind(1, path);
+    remove_rows.Bind(2, below);
+    remove_rows.Bind(3, beyond);
+    const int result = remove_rows.Execute();
+    if (result < 0 || sqlite3_changes(db) > 0) free_numbers.clear();
+    return result;
+}
+
+int FileDBState::ForgetIfOwed() {
+    if (!must_forget) return 0;
+    unproven = 0;
+    free_numbers.clear();
+    static_cast<void>(EndBatch());  // its rows go anyway
+    if (begin.Execute() < 0) return -1;
+    const int result =
+        End(ExecSql(db,
+                    "DELETE FROM file_info_table WHERE id IN ( SELECT id FROM unproven_table );"
+                    "DELETE FROM unproven_table;"));
+    must_forget = result < 0;
+    return result;
 }
 
 std::string EndOfPrefix(std::string prefix) {

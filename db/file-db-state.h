@@ -19,10 +19,19 @@ struct FileDBState {
     // Sets up a transaction around statements: all or nothing. An open batch is ended before.
     [[nodiscard]] int Begin();
     [[nodiscard]] int End(int result);
+    // The same, and on the disk when it is ended well. Ended also when the beginning failed.
+    [[nodiscard]] int BeginDurable();
+    [[nodiscard]] int EndDurable(int result);
     // The same around statements of many operations; ended after some rows, and by EndBatch().
     [[nodiscard]] int BeginInBatch();
     [[nodiscard]] int EndInBatch(int result);
     [[nodiscard]] int EndBatch();
+
+    // Removes the row of the path and all below.
+    [[nodiscard]] int RemoveRows(const std::string& path);
+    // Forgets all rows that are unproven, if that is still to be done after a failed flush. Until
+    // then nobody may believe a row.
+    [[nodiscard]] int ForgetIfOwed();
 
     sqlite3* db;
 
@@ -36,9 +45,12 @@ struct FileDBState {
     // long as no row goes or changes its destination, which empties it.
     std::unordered_map<std::string, uint64_t> free_numbers;
 
-    uint64_t batch_rows = 0;  // of the open batch; 0 when there is none
+    uint64_t batch_rows = 0;     // of the open batch; 0 when there is none
+    bool has_lost_rows = false;  // with a batch that failed
     bool has_flush_failed = false;
-    uint64_t unproven = 0;  // rows of files since the last proof
+    bool must_forget = false;     // what is unproven: a flush failed
+    bool has_moved_files = true;  // noted names; most tasks have none
+    uint64_t unproven = 0;        // rows of files since the last proof
     std::chrono::steady_clock::time_point unproven_since{};
 };
 

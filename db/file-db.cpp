@@ -4,7 +4,6 @@
 
 #include "file-db-state.h"
 #include "utils/log.h"
-#include "utils/path-util.h"
 
 namespace {
 
@@ -124,15 +123,8 @@ int FileDB::RemoveFileInfoBySourcePath(const std::string& path) {
         SLOG_ERR("RemoveFileInfoBySourcePath: src_path is empty");
         return -1;
     }
-    const std::string below = PathAddTrailingSlash(path);
-    const std::string end = EndOfPrefix(below);
     const DbLock lock(m_mutex);
-    if (m_state == nullptr) return -1;
-    m_state->free_numbers.clear();
-    m_state->remove_rows.Bind(1, path);
-    m_state->remove_rows.Bind(2, below);
-    m_state->remove_rows.Bind(3, end);
-    return m_state->remove_rows.Execute();
+    return m_state == nullptr ? -1 : m_state->RemoveRows(path);
 }
 
 int FileDB::DstPathFormatChanged(const std::string& src, const std::string& dst, bool& changed) {

@@ -3,9 +3,10 @@
 // destination, so that a copy may be moved, renamed or removed there and still counts as done.
 //
 // A row says "I have this file", and must never outlive the file. So each row of a file that is new
-// or changed is unproven at first: triggers in the file note it in the same transaction. Once the
-// destination has been flushed, ProveFileInfo() strikes the note out; opening the database removes
-// the rows that are still noted, because nobody knows what became of their files.
+// or changed, or of a folder that was made, is unproven at first: triggers in the file note it in
+// the same transaction. Once the destination has been flushed, ProveFileInfo() strikes the note
+// out; opening the database removes the rows that are still noted, because nobody knows what became
+// of their files.
 //
 // Threads: every operation may be called from any thread; one mutex is held for a whole operation.
 // Results: 0 or -1; reads of one row give 1 (found, the record is filled), 0 (no such row, the
@@ -41,7 +42,7 @@ public:
     [[nodiscard]] int SetFileInfoBySourcePath(const FileInfo& info);
     // The same in one transaction with the rows before and after it, which costs a fraction. Other
     // programs see it at the latest with the next proof; a crash loses it, as it loses all rows
-    // that are unproven. A failure loses the rows of the transaction.
+    // that are unproven. A failure loses the rows of the transaction, here or where it ends.
     [[nodiscard]] int SetFileInfoInBatch(const FileInfo& info);
     // Ends the transaction, before what may take long: while it is open nobody else can write.
     [[nodiscard]] int EndBatch();
@@ -62,8 +63,9 @@ public:
 
     // --- Names at the destination
 
-    // Notes where a file went that leaves no row because its source goes: no other file may take
-    // that name until ForgetMovedFiles(). A name is noted once, the last note holds.
+    // Notes where a file went that leaves no row because its source goes, and removes the row that
+    // it had: no other file may take that name until ForgetMovedFiles(). On the disk when it
+    // returns 0: the source may be removed. A name is noted once, the last note holds.
     [[nodiscard]] int AddMovedFile(const FileInfo& info);
     // Fills in the destination that was noted for this source path, size and time.
     [[nodiscard]] int GetMovedFile(FileInfo& info);
@@ -82,17 +84,20 @@ public:
 
     // --- Proof
 
-    // The row is unproven from now on, and that is on the disk: its file is about to be replaced.
-    // No such row is no failure.
+    // The row is unproven until it is written again, whatever is proven, and that is on the disk:
+    // its file is about to be replaced. No such row is no failure.
     [[nodiscard]] int DoubtFileInfo(const std::string& source_path);
     // Taken before a flush, given to ProveFileInfo() after it: what is written between the two
     // stays unproven. 0 when nothing is unproven.
     [[nodiscard]] int GetUnprovenMark(int64_t& mark);
     [[nodiscard]] int ProveFileInfo(int64_t mark);
-    // The flush failed: all rows that are unproven go.
+    // The flush failed: all rows that are unproven go. When that fails it is done before any row is
+    // listed or proven, which fails until then.
     [[nodiscard]] int ForgetUnproven();
     // Whether that was called since the last time one asked.
     [[nodiscard]] bool TakeFlushFailure();
+    // Whether rows were lost with a batch since the last time one asked.
+    [[nodiscard]] bool TakeRowLoss();
     // How many files were recorded since the last mark that was proven, and since how many seconds
     // the first of them waits.
     [[nodiscard]] uint64_t UnprovenCount();

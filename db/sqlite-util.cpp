@@ -31,20 +31,6 @@ void PrepareFile(const std::string& path) {
     }
 }
 
-// Putting a fresh file into WAL mode fails at once when another connection does so too: sqlite does
-// not apply its busy timeout there. The script may be run again from its start.
-int RunScript(sqlite3* db, const char* script) {
-    const auto deadline =
-        std::chrono::steady_clock::now() + std::chrono::milliseconds(kBusyTimeoutMs);
-    for (;;) {
-        const int code = sqlite3_exec(db, script, nullptr, nullptr, nullptr);
-        if (code != SQLITE_BUSY || std::chrono::steady_clock::now() >= deadline) return code;
-        if (sqlite3_get_autocommit(db) == 0)
-            sqlite3_exec(db, "ROLLBACK", nullptr, nullptr, nullptr);
-        sqlite3_sleep(kRetryMs);
-    }
-}
-
 UniqueSqlText FormatSqlList(const char* format, va_list arguments) {
     UniqueSqlText sql(sqlite3_vmprintf(format, arguments));
     if (!sql) SLOG_ERR("sqlite3_mprintf: return NULL\n%s\n", format);
@@ -55,6 +41,17 @@ UniqueSqlText FormatSqlList(const char* format, va_list arguments) {
 
 void SqlTextFree::operator()(char* text) const { sqlite3_free(text); }
 
+int RunSqlScript(sqlite3* db, const char* script, int wait_ms) {
+    const auto deadline = std::chrono::steady_clock::now() + std::chrono::milliseconds(wait_ms);
+    for (;;) {
+        const int code = sqlite3_exec(db, script, nullptr, nullptr, nullptr);
+        if (code != SQLITE_BUSY || std::chrono::steady_clock::now() >= deadline) return code;
+        if (sqlite3_get_autocommit(db) == 0)
+            sqlite3_exec(db, "ROLLBACK", nullptr, nullptr, nullptr);
+        sqlite3_sleep(kRetryMs);
+    }
+}
+
 DatabaseOpenResult OpenDatabase(const std::string& path, const char* script) {
     DatabaseOpenResult result;
     PrepareFile(path);
@@ -64,7 +61,7 @@ DatabaseOpenResult OpenDatabase(const std::string& path, const char* script) {
         result.failed_step = DatabaseOpenResult::OPEN;
     } else {
         sqlite3_busy_timeout(result.db, kBusyTimeoutMs);
-        result.code = RunScript(result.db, script);
+        result.code = RunSqlScript(result.db, script, kBusyTimeoutMs);
         if (result.code != SQLITE_OK) result.failed_step = DatabaseOpenResult::SCHEMA;
     }
     if (result.failed_step != DatabaseOpenResult::DONE) {

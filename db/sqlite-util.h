@@ -29,6 +29,11 @@ struct DatabaseOpenResult {
 // for a file that is locked.
 [[nodiscard]] DatabaseOpenResult OpenDatabase(const std::string& path, const char* script);
 
+// Runs a script that may be run again from its start, and gives the code of sqlite. Where a file
+// enters or leaves the WAL mode sqlite does not wait for other connections, whatever its busy
+// timeout is: this does, up to `wait_ms`.
+[[nodiscard]] int RunSqlScript(sqlite3* db, const char* script, int wait_ms);
+
 // Formats a statement as sqlite3_mprintf does: "%Q" quotes a text, null when memory is short.
 [[nodiscard]] UniqueSqlText FormatSql(const char* format, ...);
 // Runs a statement that gives no rows, ready or to be formatted. 0 or -1.

@@ -48,3 +48,8 @@ int WriteDurableFile(const std::string& path, const std::string& content) {
                             IsFolderSynced(PathDirName(path));
     return is_written ? 0 : -1;
 }
+
+int RemoveDurableFile(const std::string& path) {
+    const bool is_removed = unlink(path.c_str()) == 0 || errno == ENOENT;
+    return is_removed && IsFolderSynced(PathDirName(path)) ? 0 : -1;
+}

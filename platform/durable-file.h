@@ -9,3 +9,5 @@
 // On the disk, readable by its owner alone, when it returns 0; -1 with errno, and the old content
 // stays.
 [[nodiscard]] int WriteDurableFile(const std::string& path, const std::string& content);
+// Gone for good when it returns 0, also when there was none; -1 with errno.
+[[nodiscard]] int RemoveDurableFile(const std::string& path);

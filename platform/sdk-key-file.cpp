@@ -18,9 +18,9 @@ int GetKeyValue(const std::string& file, const std::string& key, size_t size, st
     return found;
 }
 
-bool HasKeyValue(const std::string& file, const std::string& key, const std::string& value) {
+int CheckKeyValue(const std::string& file, const std::string& key, const std::string& value) {
     const ReentrantLock lock;
-    return KLIBCFileCheckKeyValue(file.c_str(), key.c_str(), value.c_str()) > 0;
+    return KLIBCFileCheckKeyValue(file.c_str(), key.c_str(), value.c_str());
 }
 
 int RemoveKey(const std::string& file, const std::string& key) {

@@ -12,9 +12,10 @@ namespace SDK {
 // error; the value is then empty.
 [[nodiscard]] int GetKeyValue(const std::string& file, const std::string& key, size_t size,
                               std::string& value);
-// True when the key has this value; false for another one, for none and on an error.
-[[nodiscard]] bool HasKeyValue(const std::string& file, const std::string& key,
-                               const std::string& value);
+// 1 when the key has this value; 0 for another one, and when the key or the file is missing;
+// negative on an error.
+[[nodiscard]] int CheckKeyValue(const std::string& file, const std::string& key,
+                                const std::string& value);
 // 0 or above, also when there is no such key; negative on an error.
 [[nodiscard]] int RemoveKey(const std::string& file, const std::string& key);
 

@@ -6,20 +6,19 @@
 #include "db/task-db.h"
 #include "platform/error-handler.h"
 #include "platform/keld-notification.h"
-#include "platform/utility.h"
 #include "processor/hardware-controller.h"
 #include "processor/run-aftermath.h"
 #include "processor/task-entry-handler.h"
 #include "processor/task-event-manager.h"
 #include "strategy/copy-strategy-handler.h"
+#include "strategy/run-progress.h"
 #include "strategy/task-handler.h"
+#include "strategy/version-start.h"
 #include "utils/error-code.h"
 #include "utils/log.h"
 #include "utils/mutex-lock.h"
 
 namespace {
-
-constexpr char kVersionDirFormat[] = "Ferrix Copy_%F_%H%M%S";
 
 LogDescription::ID LogIdOf(bool is_end, int result) {
     if (!is_end) return LogDescription::LOG_DESC_TASK_STARTED;
@@ -59,19 +58,17 @@ int TaskProcessor::GetEvent() {
     if (TaskEventManager::GetInstance().PullEvent(task_id) != 1) return -1;
     TaskEntryHandler::GetInstance().SetTaskState(task_id, TASK_RUN_STATE_RUNNING);
     Ferrix::ErrorHandler::GetInstance().Clear(task_id);
+    RunProgress::GetInstance().Begin(task_id);
     m_task_event.task_id = task_id;
     m_retry_count.Reset();
     SLOG_INFO("TaskProcessor (%d): Get a task event: '%llu'\n", GetID(), Llu(task_id));
     return 0;
 }
 
-int TaskProcessor::SetVersionDir() {
-    const uint64_t task_id = m_task_event.task_id;
-    const time_t now = time(nullptr);
-    tm local{};
+int TaskProcessor::SetVersionDir(const TaskRunInfo& task) {
+    const uint64_t task_id = task.task_id;
     std::string version_dir;
-    if (localtime_r(&now, &local) == nullptr ||
-        GetTimeString(local, kVersionDirFormat, version_dir) < 0) {
+    if (NameNewVersion(task, time(nullptr), version_dir) < 0) {
         SLOG_ERR("Failed to get time str '%llu'\n", Llu(task_id));
         return -1;
     }
@@ -91,7 +88,7 @@ int TaskProcessor::LoadRunInfo() {
         SLOG_ERR("Task id '%llu' does not exist\n", Llu(task_id));
         is_ready = false;
     } else if (run_info.copy_strategy == COPY_STRATEGY_VERSION) {
-        is_ready = SetVersionDir() == 0;
+        is_ready = SetVersionDir(run_info) == 0;
     }
     if (!is_ready) {
         SLOG_ERR("Failed to update version dir for '%llu'\n", Llu(task_id));

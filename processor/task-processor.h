@@ -33,7 +33,7 @@ protected:
 private:
     int PrepareTask();
     int LoadRunInfo();
-    int SetVersionDir();
+    int SetVersionDir(const TaskRunInfo& task);
     int RunTask();
     void LetGo();
 

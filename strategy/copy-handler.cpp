@@ -7,6 +7,7 @@
 #include "strategy/file-event-context.h"
 #include "strategy/recycle-bin.h"
 #include "strategy/root-check.h"
+#include "strategy/run-progress.h"
 #include "utils/confined-path.h"
 #include "utils/error-code.h"
 #include "utils/file-op.h"
@@ -15,6 +16,9 @@
 
 int CopyHandler::Handle() {
     const int result = RunSteps();
+    if (result == ERR_SUCCESS) {
+        RunProgress::GetInstance().CountFile(Task().task_id, m_src_info.size);
+    }
     // A file that cannot be read because its device is gone shall not be tried again and again.
     if (result == ERR_SRC_MISS || result == ERR_FILE_OPERATION || result == ERR_IO) {
         if (const int gone = CheckTaskRoots(Task()); gone < 0) return gone;
@@ -82,7 +86,8 @@ int CopyHandler::CreateParentFolder() {
 }
 
 int CopyHandler::RunCopy() {
-    const int overwrite = IsOverwritePolicy() || m_overwrite_allowed ? 1 : -1;
+    const int overwrite =
+        !m_must_keep_existing && (IsOverwritePolicy() || m_overwrite_allowed) ? 1 : -1;
     auto* flag = const_cast<std::atomic<int>*>(AbortFlag());  // the callback only reads it
     const KeldCopyResult copied =
         KeldCopyFile(m_copy_from_full_path, m_copy_to_full_path, overwrite, DESTINATION_OWNER,
@@ -179,7 +184,7 @@ int CopyHandler::HandleDstTypeConflict() {
         return ERR_DST_TYPE_CONFLICT;
     }
     return ClearTypeConflict(Task(), m_copy_to_full_path, info.type == FS_TYPE_DIR,
-                             IsOverwritePolicy());
+                             IsOverwritePolicy() && !m_must_keep_existing);
 }
 
 int CopyHandler::Finish() {

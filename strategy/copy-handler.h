@@ -31,6 +31,7 @@ protected:
     std::string m_copy_from_full_path;
     FSInfo m_src_info;
     bool m_overwrite_allowed = true;
+    bool m_must_keep_existing = false;  // what is there moves aside under any policy
 
 private:
     [[nodiscard]] int RunSteps();

@@ -82,5 +82,7 @@ int CreateHandler::HandleDstTypeConflict() {
         SLOG_INFO("Folder can be merged '%s', ignore.", path.c_str());
         return ERR_SUCCESS;
     }
-    return ClearTypeConflict(Task(), path, false, IsOverwritePolicy());
+    // A moved file of another spelling may be the only one.
+    const bool is_kept = IsSourceRemoved() && IsSpelledOtherwise(Task().dst_dir_path, path);
+    return ClearTypeConflict(Task(), path, false, IsOverwritePolicy() && !is_kept);
 }

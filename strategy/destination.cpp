@@ -4,7 +4,22 @@
 #include "strategy/recycle-bin.h"
 #include "strategy/root-check.h"
 #include "utils/error-code.h"
+#include "utils/file-op.h"
 #include "utils/log.h"
+
+namespace {
+
+bool HasEntry(const std::string& folder, const std::string& name) {
+    FSDir dir;
+    if (FSOpenDir(folder, 0, dir) < 0) return false;
+    FSDirEntry entry;
+    while (FSReadDir(dir, entry) == 1) {
+        if (entry.name == name) return true;
+    }
+    return false;
+}
+
+}  // namespace
 
 int RenameConflict(const std::string& path, const char* reason, int code) {
     // The codes of a failed rename are negative: it goes the way of a successful one, and the next
@@ -27,4 +42,12 @@ int ClearTypeConflict(const TaskRunInfo& task, const std::string& path, bool is_
     static_cast<void>(RecycleBin().RemoveFile(path, is_dir));
     SLOG_INFO("Conflict Policy is overwrite, remove '%s', try copy again.", path.c_str());
     return ERR_DST_TYPE_CONFLICT;
+}
+
+bool IsSpelledOtherwise(const std::string& root, const std::string& path) {
+    if (!FSExists(path)) return false;
+    for (std::string at = path; at.size() > root.size(); at = PathDirName(at)) {
+        if (!HasEntry(PathDirName(at), PathBaseName(at))) return true;
+    }
+    return false;
 }

@@ -19,3 +19,9 @@ inline constexpr int DESTINATION_GROUP = 100;
 // Returns "Destination file type conflict", with which the event runs again, or another code.
 [[nodiscard]] int ClearTypeConflict(const TaskRunInfo& task, const std::string& path, bool is_dir,
                                     bool is_overwrite);
+
+// Whether something stands under the path that has another name in its folder, or lies in a folder
+// that has: a file system that ignores case, or keeps short names, finds one file under several
+// names. `root` is a folder above, whose own name is taken as it is. True also when that cannot be
+// told. The folders are listed: not for every file.
+[[nodiscard]] bool IsSpelledOtherwise(const std::string& root, const std::string& path);

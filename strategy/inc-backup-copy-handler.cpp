@@ -5,6 +5,7 @@
 #include "db/file-db.h"
 #include "platform/unproven-run.h"
 #include "platform/utility.h"
+#include "strategy/destination.h"
 #include "strategy/inc-backup-path.h"
 #include "strategy/record-proof.h"
 #include "strategy/task-run-info.h"
@@ -48,6 +49,9 @@ int IncBackupCopyHandler::SetCopyToFullPath() {
     if (m_src_info.size >= LONG_COPY_BYTES && Task().file_db->EndBatch() < 0) return ERR_SYSTEM;
     m_copy_to_full_path = IncBackupGetDstFullPath(Task(), dst_ev_path);
     SLOG_INFO("IncBackupCopyHandler: SetCopyToFullPath = %s", m_copy_to_full_path.c_str());
+    // It may be the only copy of another file, whose name differs in case and which was moved.
+    m_must_keep_existing =
+        IsSourceRemoved() && IsSpelledOtherwise(Task().dst_dir_path, m_copy_to_full_path);
     return ERR_SUCCESS;
 }
 
@@ -105,8 +109,9 @@ int IncBackupCopyHandler::GetMappedDstEventPath(FileDB& db, std::string& dst_ev_
     if (dst_ev_path.empty() || dst_ev_path == "/") return 0;
     // Moved before, but its source could not be removed: the same name again.
     FileInfo moved{EventPath(), "", FILE_INFO_FILE, m_src_info.size, m_src_info.mtime};
-    if (IsSourceRemoved() && db.GetMovedFile(moved) == 1 &&
-        FileDB::IsVariant(moved.destination_path, dst_ev_path)) {
+    const int was_moved = db.GetMovedFile(moved);
+    if (was_moved < 0) return -1;
+    if (was_moved == 1 && FileDB::IsVariant(moved.destination_path, dst_ev_path)) {
         dst_ev_path = moved.destination_path;
         return 0;
     }
@@ -148,11 +153,12 @@ bool IncBackupCopyHandler::IsUnknownOverwritable(const std::string& dst_ev_path)
 }
 
 // After a power cut or a failed flush: it has the time of the source, or lost all its bytes. It
-// must not pass for a good copy because of that time.
+// must not pass for a good copy because of that time. When sources are removed it may also be a
+// good copy, and the only one: then only a file without bytes is nobody's.
 bool IncBackupCopyHandler::IsLeftover(const FSInfo& info) const {
-    const bool is_like_it =
-        info.type == FS_TYPE_FILE &&
-        (info.size == 0 || (info.mtime == m_src_info.mtime && info.size <= m_src_info.size));
+    const bool is_cut_off =
+        !IsSourceRemoved() && info.mtime == m_src_info.mtime && info.size <= m_src_info.size;
+    const bool is_like_it = info.type == FS_TYPE_FILE && (info.size == 0 || is_cut_off);
     return is_like_it && UnprovenRun(Task().task_id).IsUnproven(info.path);
 }
 
@@ -168,8 +174,13 @@ int IncBackupCopyHandler::UpdateDB() {
 }
 
 int IncBackupCopyHandler::NoteMove() {
+    if (!Task().file_db) return LogNoFileDB(ERR_SYSTEM);
     // With the folders of the source no two files of a run have one name.
-    if (Task().keep_dir_structure || !Task().file_db) return ERR_SUCCESS;
+    if (Task().keep_dir_structure) {
+        if (Task().file_db->RemoveFileInfoBySourcePath(EventPath()) == 0) return ERR_SUCCESS;
+        SLOG_ERR("Failed to RemoveFileInfoBySourcePath from DB '%s'", EventPath().c_str());
+        return ERR_SYSTEM;
+    }
     const FileInfo info{EventPath(), IncBackupGetDstEventPath(Task(), m_copy_to_full_path),
                         FILE_INFO_FILE, m_src_info.size, m_src_info.mtime};
     if (Task().file_db->AddMovedFile(info) == 0) return ERR_SUCCESS;

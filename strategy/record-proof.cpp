@@ -1,10 +1,10 @@
 #include "strategy/record-proof.h"
 
 #include "db/file-db.h"
+#include "strategy/destination-flush.h"
 #include "strategy/root-check.h"
 #include "strategy/task-run-info.h"
 #include "utils/error-code.h"
-#include "utils/file-op.h"
 #include "utils/log.h"
 
 namespace {
@@ -18,28 +18,26 @@ constexpr int64_t FLUSH_SECONDS = 30;
 // destination is gone.
 int Flush(const TaskRunInfo& task) {
     LogFlush();  // it may take long
-    if (FSSyncFileSystem(task.dst_dir_path) < 0) {
-        SLOG_ERR("Failed to flush file system of '%s' for task '%llu'", task.dst_dir_path.c_str(),
-                 Llu(task.task_id));
-        return ERR_IO;
-    }
-    const int roots = CheckTaskRoots(task);
-    return roots == ERR_SRC_ROOT_MISS ? ERR_SUCCESS : roots;
+    return FlushDestination(task) < 0 ? ERR_IO : CheckTaskDestination(task);
 }
 
 }  // namespace
 
 RecordProof::RecordProof(const TaskRunInfo& task) : m_task(task) {
-    // Without a mark nothing is proven.
-    if (task.file_db && task.file_db->GetUnprovenMark(m_mark) < 0) m_mark = 0;
+    if (!task.file_db) return;
+    const bool is_marked = task.file_db->GetUnprovenMark(m_mark) == 0;
+    if (!is_marked) m_mark = 0;  // then nothing is proven
+    if (task.file_db->TakeRowLoss() || !is_marked) m_result = ERR_SYSTEM;
 }
 
-void RecordProof::Settle(bool is_on_disk) {
-    if (!m_task.file_db) return;
+int RecordProof::Settle(bool is_on_disk) {
+    if (!m_task.file_db) return ERR_SUCCESS;
     const int result = is_on_disk ? (m_mark == 0 ? 0 : m_task.file_db->ProveFileInfo(m_mark))
                                   : m_task.file_db->ForgetUnproven();
+    if (result < 0) m_result = ERR_SYSTEM;
     // What could not be settled is forgotten when the database is opened again.
-    if (result < 0) SLOG_WARN("Copies of task '%llu' will be made again", Llu(m_task.task_id));
+    if (m_result < 0) SLOG_WARN("Copies of task '%llu' will be made again", Llu(m_task.task_id));
+    return m_result;
 }
 
 int FlushRecordsIfDue(const TaskRunInfo& task) {
@@ -49,9 +47,9 @@ int FlushRecordsIfDue(const TaskRunInfo& task) {
         return ERR_SUCCESS;
     }
     RecordProof proof(task);
-    const int result = Flush(task);
-    proof.Settle(result == ERR_SUCCESS);
-    return result;
+    const bool is_on_disk = Flush(task) == ERR_SUCCESS;
+    const int settled = proof.Settle(is_on_disk);
+    return is_on_disk ? settled : ERR_SUCCESS;
 }
 
 bool TakeFlushFailure(const TaskRunInfo& task) {

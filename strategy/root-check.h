@@ -10,3 +10,8 @@ struct TaskRunInfo;
 // 0; "Source root folder is miss" or "Destination root folder is miss" when the device, or the
 // folder on the source side, is gone; "Share not mounted" when the share is. Logged.
 [[nodiscard]] int CheckTaskRoots(const TaskRunInfo& task);
+
+// The same for the destination's side alone, whatever has become of the source: 0, "Destination
+// root folder is miss" or "Share not mounted". Asked after a flush, and where only the destination
+// matters: the first root that is missing says nothing about the other.
+[[nodiscard]] int CheckTaskDestination(const TaskRunInfo& task);

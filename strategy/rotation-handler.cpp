@@ -1,6 +1,9 @@
 #include "strategy/rotation-handler.h"
 
+#include <unistd.h>
+
 #include <algorithm>
+#include <mutex>
 
 #include "db/log-info.h"
 #include "db/log-wrapper.h"
@@ -20,6 +23,11 @@ namespace {
 // September 2020. A box without a battery for its clock starts before it.
 constexpr uint32_t CLOCK_IS_SET = 1600000000;
 
+// A run and a change of its task's settings may come to it at the same time: each would remove down
+// to the count of what it has found.
+std::mutex g_turn;
+constexpr unsigned TURN_STEP_US = 10000;
+
 }  // namespace
 
 bool RotationHandler::IsAborted() const {
@@ -27,6 +35,19 @@ bool RotationHandler::IsAborted() const {
 }
 
 int RotationHandler::Run() {
+    std::unique_lock turn(g_turn, std::try_to_lock);
+    while (!turn.owns_lock()) {
+        if (IsAborted()) {
+            SLOG_WARN("RotationHandler: user stopped while waiting for another rotation");
+            return ERR_INTERRUPTED;
+        }
+        usleep(TURN_STEP_US);
+        static_cast<void>(turn.try_lock());
+    }
+    return RunInTurn();
+}
+
+int RotationHandler::RunInTurn() {
     if (const int result = SetVersionList(); result != ERR_SUCCESS) {
         SLOG_ERR("Failed to SetVersionList");
         return result;
@@ -77,7 +98,7 @@ int RotationHandler::Rotate() {
     return result;
 }
 
-int RotationHandler::DeleteVersions(const RotationRules& rules) const {
+int RotationHandler::DeleteVersions(const RotationRules& rules) {
     const std::vector<VersionMark> marks =
         IsRemovedInPieces() ? Victims() : std::vector<VersionMark>();
     if (!marks.empty() && PutVersionMarks(m_task.task_id, marks) < 0) {
@@ -86,8 +107,23 @@ int RotationHandler::DeleteVersions(const RotationRules& rules) const {
     }
     const int result = rules.DeleteVersionList(
         m_versions, [this](const VersionInfo& version) { return RemoveVersion(version); });
-    if (!marks.empty()) DropVersionMarks(m_task.task_id, marks);
+    if (!marks.empty()) DropSettled(marks);
     return result;
+}
+
+// What has not been begun is as good as it was. The rest is settled when it is on the disk: after a
+// power cut a version may stand there again in part, under its good name.
+void RotationHandler::DropSettled(const std::vector<VersionMark>& marks) const {
+    const bool is_on_disk = m_begun.empty() || (FSSyncFileSystem(m_task.dst_dir_path) == 0 &&
+                                                CheckTaskDestination(m_task) == ERR_SUCCESS);
+    std::vector<VersionMark> settled;
+    for (const VersionMark& mark : marks) {
+        const bool is_begun = std::find(m_begun.begin(), m_begun.end(), mark.name) != m_begun.end();
+        if (!is_begun || (is_on_disk && mark.name != m_half)) settled.push_back(mark);
+    }
+    if (DropVersionMarks(m_task.task_id, settled) == 0 && settled.size() == marks.size()) return;
+    SLOG_WARN("Removed versions of task '%llu' are looked at again when it is loaded",
+              Llu(m_task.task_id));
 }
 
 std::vector<VersionMark> RotationHandler::Victims() const {
@@ -111,17 +147,30 @@ bool RotationHandler::IsRemovedInPieces() const {
            !share.IsRecycleBinEnabled();
 }
 
-int RotationHandler::RemoveVersion(const VersionInfo& version) const {
+// After a removal that failed, when what could go of the version is gone: false if the rest of it
+// may still pass for a good one.
+bool RotationHandler::IsGoneOrBad(const std::string& path) const {
+    FSInfo info;
+    if (FSStat(path, info) == 0 && !info.exist) return CheckTaskDestination(m_task) == ERR_SUCCESS;
+    return IsRemovedInPieces() && MarkVersionBad(m_task, path) == 0;
+}
+
+int RotationHandler::RemoveVersion(const VersionInfo& version) {
     const std::string& path = version.path;
     SLOG_INFO("RotationHandler: remove path '%s'", path.c_str());
+    FSInfo info;
+    const bool is_known = FSStat(path, info) == 0;
     // A folder that is missing because its file system has gone has not been removed. That the
-    // device of an import has gone does not matter any more.
-    const int roots = CheckTaskRoots(m_task);
-    if (roots == ERR_DST_ROOT_MISS || roots == ERR_SHARE_NOT_MOUNTED) return roots;
-    if (RecycleBin().RemoveFile(path, true) < 0) {
+    // source has gone does not matter any more.
+    if (const int result = CheckTaskDestination(m_task); result < 0) return result;
+    if (is_known && !info.exist) {
+        SLOG_INFO("Version '%s' is gone already", path.c_str());
+        return ERR_SUCCESS;
+    }
+    if (!version.is_bad) m_begun.push_back(PathBaseName(path));
+    if (RecycleBin().RemoveFile(path, !is_known || info.type == FS_TYPE_DIR) < 0) {
         SLOG_ERR("Failed to remove file '%s'", path.c_str());
-        // What could go of it is gone.
-        if (!version.is_bad && IsRemovedInPieces() && FSExists(path)) MarkVersionBad(m_task, path);
+        if (!version.is_bad && !IsGoneOrBad(path)) m_half = PathBaseName(path);
         return ERR_FILE_OPERATION;
     }
     LogInfo log;

@@ -5,9 +5,11 @@
 // which versions are old.
 //
 // Removal goes through the recycle bin of the share. While it is under way the versions that are to
-// go are on record (strategy/version-mark.h): one that is half removed does not pass for good.
+// go are on record (strategy/version-mark.h): one that is half removed does not pass for good. The
+// record of what was removed goes when that is on the disk.
 //
-// Used for one rotation, on one thread: Init(), SetAbortFlag(), Run().
+// Used for one rotation, on one thread: Init(), SetAbortFlag(), Run(). There is one rotation at a
+// time in the process; another waits for it.
 #pragma once
 
 #include <atomic>
@@ -30,7 +32,7 @@ public:
     RotationHandler& operator=(const RotationHandler&) = delete;
 
     void Init(const TaskRunInfo& task) { m_task = task; }
-    // Looked at between versions, not while one is being removed. May be null.
+    // Looked at while waiting and between versions, not while one is being removed. May be null.
     void SetAbortFlag(const std::atomic<int>* abort_flag) { m_abort_flag = abort_flag; }
 
     // 0 or a negative ErrorCode; what has been removed by then stays removed.
@@ -38,15 +40,18 @@ public:
 
 private:
     [[nodiscard]] bool IsAborted() const;
+    [[nodiscard]] int RunInTurn();
     [[nodiscard]] int SetVersionList();
     [[nodiscard]] int AddVersion(const std::string& entry_path);
     [[nodiscard]] int Rotate();
-    [[nodiscard]] int DeleteVersions(const RotationRules& rules) const;
+    [[nodiscard]] int DeleteVersions(const RotationRules& rules);
+    void DropSettled(const std::vector<VersionMark>& marks) const;
     // What is to go, as marks in the order of removal.
     [[nodiscard]] std::vector<VersionMark> Victims() const;
     // False when nothing can be removed, and when the recycle bin takes a version over as a whole.
     [[nodiscard]] bool IsRemovedInPieces() const;
-    [[nodiscard]] int RemoveVersion(const VersionInfo& version) const;
+    [[nodiscard]] int RemoveVersion(const VersionInfo& version);
+    [[nodiscard]] bool IsGoneOrBad(const std::string& path) const;
 
     uint32_t m_now;
     const std::atomic<int>* m_abort_flag = nullptr;
@@ -54,4 +59,6 @@ private:
     std::vector<std::string> m_unfinished;  // paths of versions that are being filled
     std::vector<VersionInfo> m_versions;    // the newest first
     bool m_has_later_version = false;       // a good one that begins after `now`
+    std::vector<std::string> m_begun;       // names of the good ones whose removal has begun
+    std::string m_half;                     // the one that stands there in part, with a good name
 };

@@ -40,9 +40,12 @@ int RotationHandler::SetVersionList() {
     visitor.dir_index = FileList::ROOT;
     visitor.prefix_length = folder.size();
     visitor.filter = m_task.system_filter.get();
-    if (FSForEachEntry(folder, visitor, FS_EACH_STAT, m_abort_flag, false) < 0) {
+    const int listed = FSForEachEntry(folder, visitor, FS_EACH_STAT, m_abort_flag, false);
+    if (listed < 0) {
         SLOG_ERR("interrupted while get dst file list '%s'", folder.c_str());
-        return ERR_INTERRUPTED;
+        // An interrupted run is done again until it gets through, with a full version each time: a
+        // folder that cannot be read must not be taken for that.
+        return listed == FS_EACH_ABORTED ? ERR_INTERRUPTED : ERR_IO;
     }
     std::vector<VersionMark> marks;
     if (ReadVersionMarks(m_task.task_id, marks) < 0) return ERR_SYSTEM;

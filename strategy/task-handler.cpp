@@ -12,12 +12,12 @@
 #include "platform/unproven-run.h"
 #include "processor/processor.h"
 #include "processor/task-mounts.h"
+#include "strategy/destination-flush.h"
 #include "strategy/record-proof.h"
 #include "strategy/root-check.h"
 #include "strategy/rotation-handler.h"
 #include "strategy/task-run-info.h"
 #include "strategy/version-end.h"
-#include "utils/confined-path.h"
 #include "utils/error-code.h"
 #include "utils/file-op.h"
 #include "utils/log.h"
@@ -27,34 +27,14 @@ namespace {
 constexpr unsigned POLL_STEP_US = 100000;
 constexpr int POLL_STEPS = 10;  // one second
 
-// What is to be flushed: the destination, or the root above it when nothing has been put there.
-const std::string& FlushPath(const TaskRunInfo& task) {
-    return task.dst_root && !FSExists(task.dst_dir_path) ? task.dst_root->Path()
-                                                         : task.dst_dir_path;
-}
-
-bool IsFlushed(const TaskRunInfo& task) {
-    const std::string& path = FlushPath(task);
-    SLOG_DBG("TaskHandler: flush '%s' begins", path.c_str());
-    if (FSSyncFileSystem(path) == 0) {
-        SLOG_DBG("TaskHandler: flush '%s' done", path.c_str());
-        return true;
-    }
-    SLOG_ERR("Failed to flush file system of '%s' for task '%llu'", path.c_str(),
-             Llu(task.task_id));
-    return false;
-}
-
-// Whether a flush that was reported good has reached the disk: not when the destination is gone.
-bool IsDestinationThere(int roots) { return roots == ERR_SUCCESS || roots == ERR_SRC_ROOT_MISS; }
-
 // The run was broken off: what is on the disk by now need not be copied again. A file may still be
 // under way, so that the record stays, from the start of the flush on.
 void KeepInterruptedRun(const TaskRunInfo& task) {
     const int64_t flush_start = time(nullptr);
     RecordProof records(task);
-    const bool is_on_disk = IsFlushed(task) && IsDestinationThere(CheckTaskRoots(task));
-    records.Settle(is_on_disk);
+    const bool is_on_disk =
+        FlushDestination(task) == 0 && CheckTaskDestination(task) == ERR_SUCCESS;
+    static_cast<void>(records.Settle(is_on_disk));  // the files are there, whatever the rows say
     if (TakeFlushFailure(task) || !is_on_disk) return;
     if (UnprovenRun(task.task_id).KeepSince(flush_start) < 0) {
         SLOG_WARN("Copies of task '%llu' will be made again", Llu(task.task_id));
@@ -65,18 +45,22 @@ void KeepInterruptedRun(const TaskRunInfo& task) {
 // that was there to the end: one that is gone lists as an empty folder.
 int FinishRun(const TaskRunInfo& task) {
     RecordProof records(task);
-    const bool is_flushed = IsFlushed(task);
+    const bool is_flushed = FlushDestination(task) == 0;
     const int roots = CheckTaskRoots(task);
-    records.Settle(is_flushed && IsDestinationThere(roots));
+    // A flush that was reported good has not reached the disk when the destination is gone.
+    const bool is_there = roots == ERR_SUCCESS || CheckTaskDestination(task) == ERR_SUCCESS;
+    const int settled = records.Settle(is_flushed && is_there);
     if (TakeFlushFailure(task) || !is_flushed) return roots < 0 ? roots : ERR_IO;
-    if (!IsDestinationThere(roots)) return roots;
+    if (!is_there) return roots;
     const int outcome = Ferrix::ErrorHandler::GetInstance().Get(task.task_id);
-    const bool is_all_copied = roots == ERR_SUCCESS && outcome == ERR_SUCCESS;
-    if (is_all_copied) EndRecords(task);
+    const bool is_all_copied =
+        roots == ERR_SUCCESS && settled == ERR_SUCCESS && outcome == ERR_SUCCESS;
     if (UnprovenRun(task.task_id).End(is_all_copied) < 0) {
         SLOG_WARN("Copies of task '%llu' will be made again", Llu(task.task_id));
+    } else if (is_all_copied) {
+        EndRecords(task);  // last: with the record of the run the names are still needed
     }
-    return roots;
+    return roots < 0 ? roots : settled;
 }
 
 bool IsRootMiss(int outcome) {
@@ -93,6 +77,8 @@ int TaskHandler::Run() {
         SLOG_ERR("TaskHandler: failed to pre-handle task '%llu'", Llu(m_task->task_id));
         return result;
     }
+    tzset();  // names are told in local time, and the zone may have been changed
+    const DestinationFlush flush(*m_task);
     DoHandle();
     if (const int result = PostHandle(); result < 0) {
         SLOG_ERR("TaskHandler: failed to post-handle task '%llu'", Llu(m_task->task_id));
@@ -161,6 +147,12 @@ int TaskHandler::EndVersion(const TaskRunInfo& task, int result, RotationHandler
     }
     EndGoodVersion(task);
     if (!task.enable_rotation) return ERR_SUCCESS;
+    // The new version may hold next to nothing: no whole one must go for it.
+    if (outcome == ERR_DST_QUOTA_FULL) {
+        SLOG_WARN("The destination of task '%llu' is full, no version is removed",
+                  Llu(task.task_id));
+        return ERR_SUCCESS;
+    }
     rotation.Init(task);
     rotation.SetAbortFlag(m_abort_flag);
     result = rotation.Run();

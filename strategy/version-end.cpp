@@ -18,7 +18,6 @@
 
 namespace {
 
-constexpr int RENAME_MISSING = -2;
 constexpr unsigned POLL_STEP_US = 10000;
 constexpr int POLL_STEPS = 1000;  // ten seconds
 
@@ -56,6 +55,12 @@ bool Settle(const VersionMark& mark, const TaskRunInfo& task, bool& is_there) {
     return FSSyncFileSystem(folder) == 0;  // not to be lost when the mark is gone
 }
 
+void DropSettled(const TaskRunInfo& task, const std::vector<VersionMark>& marks) {
+    if (DropVersionMarks(task.task_id, marks) == 0) return;
+    SLOG_WARN("Settled versions of task '%llu' are looked at again when it is loaded",
+              Llu(task.task_id));
+}
+
 void SettleMarks(const TaskRunInfo& task, bool is_loading) {
     std::vector<VersionMark> marks;
     if (ReadVersionMarks(task.task_id, marks) < 0 || marks.empty()) return;
@@ -73,7 +78,7 @@ void SettleMarks(const TaskRunInfo& task, bool is_loading) {
         if (is_removal && is_there) is_found = true;
         if (is_removal && !is_settled) is_waiting = true;
     }
-    if (!settled.empty()) DropVersionMarks(task.task_id, settled);
+    if (!settled.empty()) DropSettled(task, settled);
 }
 
 }  // namespace
@@ -91,17 +96,24 @@ int MarkVersionBad(const TaskRunInfo& task, const std::string& path) {
 }
 
 void EndGoodVersion(const TaskRunInfo& task) {
-    DropVersionMarks(task.task_id, {MakeVersionMark(task, VersionMark::FILLING)});
+    const VersionMark mark = MakeVersionMark(task, VersionMark::FILLING);
+    if (DropVersionMarks(task.task_id, {mark}) == 0) return;
+    SLOG_WARN("The whole version '%s' of task '%llu' gets a bad name when the task is loaded",
+              mark.name.c_str(), Llu(task.task_id));
 }
 
 void EndBadVersion(const TaskRunInfo& task) {
     const bool is_let_go = IsLetGoByFileWorkers(task);
-    const int renamed = MarkVersionBad(task, VersionGetDstFullPath(task, "/"));
+    const std::string path = VersionGetDstFullPath(task, "/");
+    FSInfo info;
+    // The rename does not tell a missing folder from one that cannot be asked for.
+    const bool is_missing = FSStat(path, info) == 0 && !info.exist;
+    const int renamed = MarkVersionBad(task, path);
     const VersionMark mark = MakeVersionMark(task, VersionMark::FILLING);
     // The mark stays with a folder that still has its good name, or may get it back.
-    if (!is_let_go || (renamed < 0 && renamed != RENAME_MISSING)) return;
+    if (!is_let_go || (renamed < 0 && !is_missing)) return;
     if (!IsReachable(mark, task) || FSSyncFileSystem(task.dst_dir_path) < 0) return;
-    DropVersionMarks(task.task_id, {mark});
+    DropSettled(task, {mark});
 }
 
 void SettleUnfinishedVersions(const TaskRunInfo& task) { SettleMarks(task, false); }

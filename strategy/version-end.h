@@ -8,7 +8,7 @@
 struct TaskRunInfo;
 
 // Gives the folder its ".Bad" name. 0, or the result of the failed rename (logged).
-int MarkVersionBad(const TaskRunInfo& task, const std::string& path);
+[[nodiscard]] int MarkVersionBad(const TaskRunInfo& task, const std::string& path);
 
 // The run has ended: its folder is on the disk and a good version.
 void EndGoodVersion(const TaskRunInfo& task);

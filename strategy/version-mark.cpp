@@ -1,7 +1,6 @@
 #include "strategy/version-mark.h"
 
 #include <pthread.h>
-#include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
@@ -85,8 +84,8 @@ int Read(const std::string& path, std::vector<VersionMark>& marks) {
 
 int Write(const std::string& path, const std::vector<VersionMark>& marks) {
     const int result =
-        marks.empty() ? unlink(path.c_str()) : WriteDurableFile(path, ToContent(marks));
-    if (result == 0 || (marks.empty() && errno == ENOENT)) return 0;
+        marks.empty() ? RemoveDurableFile(path) : WriteDurableFile(path, ToContent(marks));
+    if (result == 0) return 0;
     SLOG_ERR("Failed to write the marks of versions '%s': %s", path.c_str(), std::strerror(errno));
     return -1;
 }
@@ -136,5 +135,7 @@ int DropVersionMarks(uint64_t task_id, const std::vector<VersionMark>& marks) {
     };
     const size_t count = all.size();
     all.erase(std::remove_if(all.begin(), all.end(), is_dropped), all.end());
-    return all.size() == count ? 0 : Write(path, all);
+    if (all.size() == count) return 0;
+    // Tried twice: a mark that stays, or comes back after a power cut, makes a whole version bad.
+    return Write(path, all) == 0 ? 0 : Write(path, all);
 }

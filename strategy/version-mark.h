@@ -37,7 +37,7 @@ struct VersionMark {
 
 // Reads the marks of the task: 0, or -1 (logged) when they cannot be read.
 [[nodiscard]] int ReadVersionMarks(uint64_t task_id, std::vector<VersionMark>& marks);
-// Adds marks, or takes away those that equal the given ones. 0, on the disk when added; -1 (logged)
-// when the file cannot be written.
+// Adds marks, or takes away those that equal the given ones. 0, with the change on the disk; -1
+// (logged) when the file cannot be written.
 [[nodiscard]] int PutVersionMarks(uint64_t task_id, const std::vector<VersionMark>& marks);
-int DropVersionMarks(uint64_t task_id, const std::vector<VersionMark>& marks);
+[[nodiscard]] int DropVersionMarks(uint64_t task_id, const std::vector<VersionMark>& marks);

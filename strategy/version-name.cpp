@@ -1,7 +1,5 @@
 #include "strategy/version-name.h"
 
-#include <cstring>
-
 #include "platform/utility.h"
 #include "utils/file-op.h"
 
@@ -11,22 +9,13 @@ constexpr char NAME_FORMAT[] = "Ferrix Copy_%F_%H%M%S";
 constexpr char BAD_NAME_FORMAT[] = "Ferrix Copy_%F_%H%M%S.Bad";
 constexpr int TRIES = 3600;
 
-// False unless writing the parsed time again gives the name: strptime() alone takes short fields,
-// missing blanks and days that the month does not have.
 bool IsParsed(const std::string& name, const char* format, tm& fields) {
     fields = {};
 #pragma GCC diagnostic push
 #pragma GCC diagnostic ignored "-Wformat-nonliteral"
     const char* const end = strptime(name.c_str(), format, &fields);
-    if (end == nullptr || end != name.c_str() + name.size()) return false;
-    // As a plain calendar, not as local time: a box that has moved to another zone has versions
-    // whose time its clock never shows.
-    tm calendar = fields;
-    std::string again;
-    const time_t seconds = timegm(&calendar);
-    return gmtime_r(&seconds, &calendar) != nullptr &&
-           GetTimeString(calendar, format, again) == 0 && again == name;
 #pragma GCC diagnostic pop
+    return end != nullptr && end == name.c_str() + name.size();
 }
 
 bool IsSameTime(const tm& left, const tm& right) {
@@ -39,11 +28,15 @@ bool IsSameTime(const tm& left, const tm& right) {
 
 std::optional<VersionName> ParseVersionName(const std::string& name) {
     VersionName parsed;
-    if (name.size() != std::strlen(name.c_str())) return std::nullopt;
     if (IsParsed(name, NAME_FORMAT, parsed.fields)) return parsed;
     parsed.is_bad = true;
     if (IsParsed(name, BAD_NAME_FORMAT, parsed.fields)) return parsed;
     return std::nullopt;
+}
+
+int NameVersion(time_t start, std::string& name) {
+    tm local{};
+    return localtime_r(&start, &local) == nullptr ? -1 : GetTimeString(local, NAME_FORMAT, name);
 }
 
 int64_t VersionTime(const VersionName& name, int64_t now) {

@@ -15,8 +15,11 @@ struct VersionName {
     bool is_bad = false;
 };
 
-// Nothing unless the name is exactly what a run would give its folder: "Ferrix
-// Copy_2024-3-9_141502" and a 31st of February are some user's own.
+// The name of the folder of a run that starts at that time. 0, or -1 when it cannot be told.
+[[nodiscard]] int NameVersion(time_t start, std::string& name);
+
+// Nothing unless strptime(3) takes the whole name. That is generous: "Ferrix Copy_2024-3-9_141502"
+// counts too, and a 31st of February is one of the first days of March.
 [[nodiscard]] std::optional<VersionName> ParseVersionName(const std::string& name);
 
 // The seconds since the epoch at which the local time of the name was. A time that the clock showed

@@ -30,3 +30,10 @@ int DatabaseConnection::Open(const std::string& path, int flags) {
 }
 
 int DatabaseConnection::Run(const char* sql) { return ExecSql(m_db, sql); }
+
+int DatabaseConnection::RunScript(const char* script) {
+    const int code = RunSqlScript(m_db, script, BUSY_TIMEOUT_MS);
+    if (code == SQLITE_OK) return 0;
+    SLOG_ERR("sqlite3_exec: [%d] %s\n", code, sqlite3_errmsg(m_db));
+    return -1;
+}

@@ -5,25 +5,29 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <cstdio>
 #include <cstring>
 
+#include "db/side-files.h"
 #include "updater/database-connection.h"
 #include "utils/file-op.h"
 #include "utils/log.h"
 
 namespace {
 
-constexpr const char* SIDE_FILES[] = {"-wal", "-shm", "-journal"};
-
-bool IsMissing(const std::string& path) {
-    return access(path.c_str(), F_OK) != 0 && errno == ENOENT;
+int RenameToFreePlace(const char* from, const char* to) {
+    if (renameat2(AT_FDCWD, from, AT_FDCWD, to, RENAME_NOREPLACE) == 0) return 0;
+    // An older kernel, or a file system that cannot do it.
+    if ((errno != ENOSYS && errno != EINVAL) || !IsMissing(to)) return -1;
+    return rename(from, to);
 }
 
-bool IsSingleFile(const std::string& path) {
-    for (const char* side_file : SIDE_FILES) {
-        if (!IsMissing(path + side_file)) return false;
-    }
-    return true;
+int Move(const std::string& from, const std::string& to, Place place) {
+    if (place == Place::TAKEN) return FSRename(from, to) < 0 ? -1 : 0;
+    if (RenameToFreePlace(from.c_str(), to.c_str()) == 0) return 0;
+    SLOG_ERR("'%s' cannot become '%s': %s (%d)\n", from.c_str(), to.c_str(), std::strerror(errno),
+             errno);
+    return -1;
 }
 
 int SyncFolderOf(const std::string& path) {
@@ -41,27 +45,20 @@ int MakeSingleFile(const std::string& path) {
     {
         DatabaseConnection connection;
         if (connection.Open(path, SQLITE_OPEN_READWRITE) < 0) return -1;
-        if (connection.Run(GATHER) < 0) return -1;
+        if (connection.RunScript(GATHER) < 0) return -1;
     }
     if (IsSingleFile(path)) return 0;
     SLOG_ERR("The journal of '%s' cannot be taken in\n", path.c_str());
     return -1;
 }
 
-bool HasJournal(const std::string& path) { return !IsMissing(path + "-journal"); }
-
-void RemoveDatabase(const std::string& path) {
-    for (const char* side_file : SIDE_FILES) unlink((path + side_file).c_str());
-    unlink(path.c_str());
-}
-
-int PutInPlace(const std::string& from, const std::string& to, bool& is_moved) {
+int PutInPlace(const std::string& from, const std::string& to, Place place, bool& is_moved) {
     is_moved = false;
     if (!IsSingleFile(from) || !IsSingleFile(to)) {
         SLOG_ERR("A journal lies beside '%s' or '%s'\n", from.c_str(), to.c_str());
         return -1;
     }
-    if (FSRename(from, to) < 0) return -1;
+    if (Move(from, to, place) < 0) return -1;
     is_moved = true;
     if (SyncFolderOf(to) == 0) return 0;
     SLOG_ERR("The folder of '%s' cannot be flushed: %s (%d)\n", to.c_str(), std::strerror(errno),
@@ -72,15 +69,14 @@ int PutInPlace(const std::string& from, const std::string& to, bool& is_moved) {
 DatabaseCopy::DatabaseCopy(std::string original, unsigned version)
     : m_original(std::move(original)), m_copy(m_original + ".bkp_v" + std::to_string(version)) {}
 
-DatabaseCopy::~DatabaseCopy() { RemoveDatabase(m_copy); }
+DatabaseCopy::~DatabaseCopy() { (void)!RemoveDatabase(m_copy); }
 
 int DatabaseCopy::Make() {
-    RemoveDatabase(m_copy);
-    if (MakeSingleFile(m_original) < 0) return -1;
+    if (RemoveDatabase(m_copy) < 0 || MakeSingleFile(m_original) < 0) return -1;
     return CopyFile(m_original, m_copy, false) < 0 ? -1 : 0;
 }
 
 int DatabaseCopy::ReplaceOriginal() {
     if (MakeSingleFile(m_copy) < 0) return -1;
-    return PutInPlace(m_copy, m_original, m_has_replaced);
+    return PutInPlace(m_copy, m_original, Place::TAKEN, m_has_replaced);
 }

@@ -1,7 +1,7 @@
 // A database file as a file: with what sqlite puts beside it, copied, and put in another's place.
 //
-// sqlite takes a journal that lies beside a database for that database's own and plays it back. So
-// a file is moved only while neither it nor the one that it replaces has any.
+// A file is moved only while neither it nor the one that it replaces has anything beside it
+// (db/side-files.h).
 // Failures are logged. Threads: any, one for each database.
 #pragma once
 
@@ -9,19 +9,17 @@
 
 // Brings everything into the one file: what lies in a write-ahead log, or waits to be rolled back
 // in a journal, after a crash of the daemon. The content does not change. 0 or -1, as when another
-// program has the file open.
+// program keeps the file open for longer than a minute.
 [[nodiscard]] int MakeSingleFile(const std::string& path);
 
-// Whether a transaction was broken off and waits to be rolled back, which a reader cannot do.
-[[nodiscard]] bool HasJournal(const std::string& path);
-
-// Removes the database with all that lies beside it. Nothing there is no failure.
-void RemoveDatabase(const std::string& path);
+// Whether something is in the place that a file is put in, and may be replaced.
+enum class Place { FREE, TAKEN };
 
 // Puts `from` in the place of `to` in one step, there for good when it returns 0. -1 when one of
-// the two is no single file, too. `is_moved` tells whether it has the place, also after a failure
-// to make that last.
-[[nodiscard]] int PutInPlace(const std::string& from, const std::string& to, bool& is_moved);
+// the two is no single file, too, or something is in a place that was to be free. `is_moved` tells
+// whether it has the place, also after a failure to make that last.
+[[nodiscard]] int PutInPlace(const std::string& from, const std::string& to, Place place,
+                             bool& is_moved);
 
 // A copy to work on, beside the original and named by its version; it is gone at the end unless it
 // has taken the place of the original.

@@ -3,11 +3,16 @@
 #include <json/value.h>
 #include <sys/stat.h>
 
+#include <algorithm>
+
+#include "db/side-files.h"
+#include "db/sqlite-util.h"
 #include "filter/file-filter.h"
 #include "platform/durable-file.h"
 #include "platform/json-util.h"
 #include "platform/sdk-key-file.h"
 #include "updater/database-file.h"
+#include "updater/updater-utils.h"
 #include "utils/file-op.h"
 #include "utils/log.h"
 
@@ -44,6 +49,11 @@ void SplitOldFolder(const std::string& value, std::string& share, std::string& f
     folder = rest == std::string::npos ? "/" : "/" + path.substr(rest);
 }
 
+int AddText(const SqlQuery& row, void* context) {
+    static_cast<std::vector<std::string>*>(context)->push_back(row.Text(0));
+    return 0;
+}
+
 // The lists of names and extensions of the user's own, both empty.
 int WriteUserConfig(const std::string& path) {
     Json::Value config(Json::objectValue);
@@ -74,30 +84,39 @@ DefaultTasks::DefaultTasks(std::string repository, const BoxConfigPaths& paths)
       m_db_path(m_repository + "/db/" + "task-db.sqlite"),
       m_new_path(m_db_path + ".new") {}
 
-int DefaultTasks::Prepare() {
-    RemoveDatabase(m_new_path);
+int DefaultTasks::Prepare(bool replaces_empty) {
+    m_is_clear = RemoveDatabase(m_new_path) == 0;
     int result = 0;
     for (const Kind& kind : KINDS) {
         if (result == 0) result = PrepareRows(kind);
     }
     m_db.Close();
-    if (result == 0 && FSExists(m_new_path)) result = PutInPlace();
-    RemoveDatabase(m_new_path);
+    if (result == 0 && m_has_rows) result = PutInPlace(replaces_empty);
+    (void)!RemoveDatabase(m_new_path);
     return result == 0 ? RemoveOldKeys() : -1;
 }
 
+void DefaultTasks::RemoveLeftKeys() {
+    std::vector<std::string> uuids;
+    if (QueryEach(m_db_path, "SELECT uuid FROM usb_info_table;", AddText, &uuids) < 0) return;
+    for (const Kind& kind : KINDS) {
+        if (std::ranges::find(uuids, kind.uuid) != uuids.end()) RemoveLeftKey(kind);
+    }
+}
+
 int DefaultTasks::PrepareRows(const Kind& kind) {
-    if (!SDK::HasKeyValue(m_paths.capabilities, kind.key, "yes")) {
+    const int is_supported = SDK::CheckKeyValue(m_paths.capabilities, kind.key, "yes");
+    if (is_supported == 0) {
         SLOG_DBG("Not support '%s'\n", kind.key);
         return 0;
     }
-    if (PrepareOne(kind) == 0) return 0;
+    if (is_supported > 0 && PrepareOne(kind) == 0) return 0;
     SLOG_ERR("%s", kind.failure);
     return -1;
 }
 
 int DefaultTasks::PrepareOne(const Kind& kind) {
-    if (m_db.Init(m_new_path) < 0) {
+    if (!m_is_clear || m_db.Init(m_new_path) < 0) {
         SLOG_ERR("Failed to init task db at '%s'\n", m_new_path.c_str());
         return -1;
     }
@@ -158,6 +177,7 @@ int DefaultTasks::Create(const Kind& kind, const std::string& share, const std::
         SLOG_ERR("Faile to set default Ferrix task info\n");
         return -1;
     }
+    m_has_rows = true;
     return 0;
 }
 
@@ -186,7 +206,12 @@ int DefaultTasks::AddTask(const TaskInfo& task) {
 
 int DefaultTasks::WriteTaskFolder(uint64_t task_id) {
     const std::string folder = m_repository + "/task/" + std::to_string(task_id);
-    if (MakeTaskFolder(folder) < 0 || WriteUserConfig(folder + "/user.config") < 0) return -1;
+    // The folder may be one that a lost repository has left, and what was copied then is not what
+    // this task has copied. Its other files are replaced, or hold for any task.
+    if (MakeTaskFolder(folder) < 0 || RemoveDatabase(folder + "/file-db.sqlite") < 0 ||
+        WriteUserConfig(folder + "/user.config") < 0) {
+        return -1;
+    }
     const std::string black_list = folder + "/blacklist.filter";
     if (FileFilter::WriteBlackList(black_list, {".KeldoranFerrix.config"}, {}) < 0) {
         SLOG_ERR("Failed to write black list '%s'\n", black_list.c_str());
@@ -200,12 +225,13 @@ int DefaultTasks::WriteTaskFolder(uint64_t task_id) {
     return 0;
 }
 
-int DefaultTasks::PutInPlace() {
-    // There is no database in the place, but a journal of one that is gone may lie there.
-    RemoveDatabase(m_db_path);
+int DefaultTasks::PutInPlace(bool replaces_empty) {
+    const Place place = replaces_empty ? Place::TAKEN : Place::FREE;
     bool is_moved = false;
-    if (MakeSingleFile(m_new_path) == 0 && FSSyncFileSystem(m_repository) == 0 &&
-        ::PutInPlace(m_new_path, m_db_path, is_moved) == 0) {
+    // A journal of a database that is gone may lie in the place.
+    if ((replaces_empty || IsMissing(m_db_path)) && RemoveSideFiles(m_db_path) == 0 &&
+        MakeSingleFile(m_new_path) == 0 && FSSyncFileSystem(m_repository) == 0 &&
+        ::PutInPlace(m_new_path, m_db_path, place, is_moved) == 0) {
         return 0;
     }
     SLOG_ERR("Failed to put '%s' in its place\n", m_db_path.c_str());
@@ -213,11 +239,30 @@ int DefaultTasks::PutInPlace() {
 }
 
 int DefaultTasks::RemoveOldKeys() {
+    int result = 0;
     for (const Kind* kind : m_taken_over) {
-        if (SDK::RemoveKey(m_paths.settings, kind->old_folder_key) >= 0) continue;
-        SLOG_ERR("Failed to remove key'%s'\n", kind->old_folder_key);
+        if (RemoveOldKey(*kind) == 0) continue;
         SLOG_ERR("%s", kind->failure);
-        return -1;
+        result = -1;
     }
-    return 0;
+    return result;
+}
+
+int DefaultTasks::RemoveOldKey(const Kind& kind) {
+    if (SDK::RemoveKey(m_paths.settings, kind.old_folder_key) >= 0) return 0;
+    SLOG_ERR("Failed to remove key'%s'\n", kind.old_folder_key);
+    return -1;
+}
+
+void DefaultTasks::RemoveLeftKey(const Kind& kind) {
+    std::string old_folder;
+    const int found =
+        SDK::GetKeyValue(m_paths.settings, kind.old_folder_key, OLD_FOLDER_SIZE, old_folder);
+    if (found < 0) SLOG_ERR("Failed to get old copy folder for key '%s'\n", kind.old_folder_key);
+    std::string share;
+    std::string folder;
+    SplitOldFolder(old_folder, share, folder);
+    if (share.empty()) return;
+    // The attempt before may have failed to make its database last.
+    if (FSSyncFileSystem(m_repository) == 0) (void)!RemoveOldKey(kind);
 }

@@ -4,6 +4,7 @@
 
 #include <limits>
 
+#include "db/side-files.h"
 #include "db/sqlite-util.h"
 #include "updater/database-connection.h"
 #include "updater/database-file.h"

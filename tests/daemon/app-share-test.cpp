@@ -32,6 +32,12 @@ protected:
         m_log.Clear();
         return second.id;
     }
+    // The share of the same name on another volume; gives its path there.
+    std::string PutShareOnVolume(const std::string& share, const std::string& volume) {
+        const std::string path = m_dir.MakeDir(volume + "/" + share);
+        m_fake.AddShare({.name = share, .path = path, .volume = m_dir / volume});
+        return path;
+    }
 };
 
 // --- What all of them refuse, and what they pass over
@@ -340,13 +346,79 @@ TEST_F(ShareTest, ADeviceThatComesBeforeTheShareMovesIsLoadedAnew) {
     EXPECT_EQ(1, m_log.Count("[INFO] Ferrixd: ResumeProcessors"));
 }
 
-TEST_F(ShareTest, AnEntryOfTheRightNameIsKept) {
+// The share keeps its name, and goes to another volume.
+TEST_F(ShareTest, ADeviceThatComesBeforeTheShareChangesItsVolumeIsLoadedAnew) {
+    for (const char* kind : {"path_change", "snapshot_restore", "transform"}) {
+        const std::string device = std::string("of-") + kind;
+        AddShare("photos");
+        const uint64_t task_id = AddOn("photos", device);
+        EXPECT_EQ(0, ShareHook(std::string("pre_") + kind, "photos"));
+        EXPECT_EQ(0, PostMount(device));
+        ASSERT_TRUE(IsLoaded(task_id)) << kind;
+        ASSERT_THAT(Send("run_task", ForTask(task_id)), IsSuccess());
+        const std::string place = PutShareOnVolume("photos", "v2");
+        EXPECT_EQ(0, ShareHook(std::string("post_") + kind, "photos", "photos"));
+        EXPECT_EQ(place + "/" + device, Entry(task_id).dst_dir_path) << kind;
+        EXPECT_EQ(place, Entry(task_id).dst_root->Path()) << kind;
+        EXPECT_FALSE(TaskEventManager::GetInstance().IsInReadyQueue(task_id)) << kind;
+        EXPECT_EQ(m_log.Count("[INFO] Ferrixd: PauseProcessors"),
+                  m_log.Count("[INFO] Ferrixd: ResumeProcessors"));
+        ASSERT_EQ(0, PreUnmount(device));
+        m_fake.Unmount(MountPath(device));
+    }
+}
+
+TEST_F(ShareTest, AnExportThatComesBeforeTheShareChangesItsVolumeIsLoadedAnew) {
+    PlugIn("x", "u-x");
+    PObject request = AddRequest("x", "u-x");
+    request["task_type"] = static_cast<int>(TASK_TYPE_EXPORT_GENERAL);
+    const uint64_t task_id = Send("add_task", request)["task_id"].AsUInt64();
+    EXPECT_EQ(0, ShareHook("pre_transform", "photos"));
+    EXPECT_EQ(0, PostMount("x"));
+    ASSERT_TRUE(IsLoaded(task_id));
+    const std::string place = PutShareOnVolume("photos", "v2");
+    EXPECT_EQ(0, ShareHook("post_transform", "photos"));
+    EXPECT_EQ(place, Entry(task_id).src_dir_path);
+    EXPECT_EQ(place, Entry(task_id).src_root->Path());
+}
+
+TEST_F(ShareTest, AnEntryOfTheRightNameAndPlaceIsKeptAndGoesOn) {
+    AddShare("music");
+    const uint64_t task_id = AddOn("photos", "a");
+    PlugIn("x", "u-x");
+    PObject request = AddRequest("x", "u-x");
+    request["task_type"] = static_cast<int>(TASK_TYPE_EXPORT_GENERAL);
+    const uint64_t export_id = Send("add_task", request)["task_id"].AsUInt64();
+    // Settings that were changed while the entries live.
+    const uint64_t changed_id = AddOn("photos", "b");
+    ASSERT_THAT(Send("set_task_setting", ImportSetting(changed_id,
+                                                       {
+                                                           {"hub_share_name", "music"}
+    })),
+                IsSuccess());
+    for (const uint64_t id : {task_id, export_id, changed_id}) {
+        ASSERT_THAT(Send("run_task", ForTask(id)), IsSuccess());
+    }
+    const auto before = Entry(task_id).strategy_handler;
+    m_log.Clear();
+    for (const char* share : {"photos", "music"}) {
+        EXPECT_EQ(0, ShareHook(AFTER, share, share));
+        EXPECT_EQ(0, ShareHook("post_transform", share));
+    }
+    EXPECT_EQ(before, Entry(task_id).strategy_handler);
+    for (const uint64_t id : {task_id, export_id, changed_id}) {
+        EXPECT_TRUE(TaskEventManager::GetInstance().IsInReadyQueue(id)) << id;
+    }
+    EXPECT_FALSE(m_log.Contains("PauseProcessors"));
+}
+
+TEST_F(ShareTest, AShareThatCannotBeAskedForItsPlaceDropsNothing) {
     const uint64_t task_id = AddOn("photos", "a");
     const auto before = Entry(task_id).strategy_handler;
+    m_fake.RemoveShare("photos");
     EXPECT_EQ(0, ShareHook(AFTER, "photos", "photos"));
-    EXPECT_EQ(0, ShareHook("post_transform", "photos"));
+    EXPECT_EQ(0, ShareHook("post_snapshot_restore", "photos"));
     EXPECT_EQ(before, Entry(task_id).strategy_handler);
-    EXPECT_FALSE(m_log.Contains("PauseProcessors"));
 }
 
 TEST_F(ShareTest, AShareThatIsNotThereAfterTheChangeLeavesItsTasksOut) {

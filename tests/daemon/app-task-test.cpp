@@ -6,6 +6,7 @@
 
 #include "add-task-fixture.h"
 #include "daemon/usb-matcher.h"
+#include "db/file-db.h"
 #include "db/log-description.h"
 #include "db/task-db.h"
 #include "processor/task-entry-handler.h"
@@ -213,6 +214,30 @@ TEST_F(AddTaskTest, AFolderThatCannotBeMadeLeavesTheRows) {
     EXPECT_THAT(Tasks(), SizeIs(1));
     EXPECT_FALSE(IsLoaded(1));
     EXPECT_THAT(m_fake.SchedEntries(), IsEmpty());
+}
+
+// Numbers are given again where a repository has lost its task database and not its folders.
+TEST_F(AddTaskTest, WhatATaskOfTheSameNumberHadCopiedIsForgotten) {
+    const std::string path = TaskFolder(1) + "/file-db.sqlite";
+    m_dir.MakeDir("v1/@Ferrix/task/1");
+    {
+        FileDB left;
+        ASSERT_EQ(0, left.Init(path));
+        ASSERT_EQ(0, left.SetFileInfoBySourcePath({"/d", "/d", FILE_INFO_DIR, 0, 0}));
+    }
+    const std::string proof = m_dir.Write("v1/@Ferrix/task/1/unproven-run", "1 2 3\n");
+    ASSERT_THAT(Add([](PObject& request) { request["copy_strategy"] = 3; }), IsSuccess());
+    ASSERT_NE(nullptr, Entry(1).file_db);
+    FileInfo info;
+    EXPECT_EQ(0, Entry(1).file_db->GetFileInfoBySourcePath("/d", info));
+    EXPECT_EQ("1 2 3\n", ReadWholeFile(proof)) << "what is not trusted stays so";
+}
+
+TEST_F(AddTaskTest, WhatCannotBeForgottenIsNotTakenOver) {
+    m_dir.MakeDir("v1/@Ferrix/task/1/file-db.sqlite");
+    EXPECT_THAT(Add(), IsError(11, "Failed to InitTaskEnv"));
+    EXPECT_TRUE(m_log.Has("[ERR] Failed to create task folder '" + TaskFolder(1) + "'"));
+    EXPECT_FALSE(IsLoaded(1));
 }
 
 TEST_F(AddTaskTest, AFilterThatCannotBeWrittenLeavesTheRowsAndTheFolder) {

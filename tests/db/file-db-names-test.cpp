@@ -55,9 +55,12 @@ TEST_F(FileDBTest, TenThousandPicturesOfOneSecondGetTenThousandNames) {
         const std::string name = FileDB::NumberedPath("/2023-05-06_070809", "JPG",
                                                       FreeNumber("/2023-05-06_070809", "JPG"));
         names.insert(name);
-        ASSERT_EQ(0, m_db.AddMovedFile({"/s" + std::to_string(n), name, FILE_INFO_FILE, 1, 1}));
+        const FileInfo info{"/s" + std::to_string(n), name, FILE_INFO_FILE, 1, 1};
+        const bool is_moved = n % 50 == 0;  // which waits for the disk
+        ASSERT_EQ(0, is_moved ? m_db.AddMovedFile(info) : m_db.SetFileInfoInBatch(info));
     }
     EXPECT_EQ(10000U, names.size());
+    ProveAll();
     Reopen();
     EXPECT_EQ(10001U, FreeNumber("/2023-05-06_070809", "JPG"));
 }
@@ -78,7 +81,11 @@ TEST_F(FileDBTest, AMovedFileTakesItsNameWithoutARow) {
     EXPECT_EQ(2U, FreeNumber("/a", "jpg"));
     Reopen();
     EXPECT_EQ(1, m_db.IsDestinationTaken("/a.jpg"));
+    FileInfo moved{"/s", "", FILE_INFO_FILE, 5, 6};
+    EXPECT_EQ(1, m_db.GetMovedFile(moved));
+    EXPECT_EQ("/a.jpg", moved.destination_path);
     EXPECT_EQ(0, m_db.ForgetMovedFiles());
+    EXPECT_EQ(0, m_db.GetMovedFile(moved));
     EXPECT_EQ(0, m_db.IsDestinationTaken("/a.jpg"));
     EXPECT_EQ(1U, FreeNumber("/a", "jpg"));
 }
@@ -95,6 +102,15 @@ TEST_F(FileDBTest, AMovedFileIsKnownByItsSourceSizeAndTime) {
     }) {
         EXPECT_EQ(0, m_db.GetMovedFile(other));
     }
+}
+
+TEST_F(FileDBTest, AMovedFileLosesTheRowThatItHad) {
+    Set("/s", "/old (1).jpg");
+    Set("/s2", "/s2");
+    EXPECT_EQ(2U, FreeNumber("/old", "jpg"));
+    EXPECT_EQ(0, m_db.AddMovedFile({"/s", "/new.jpg", FILE_INFO_FILE, 5, 6}));
+    EXPECT_EQ("/s2", Sources());
+    EXPECT_EQ(1U, FreeNumber("/old", "jpg"));
 }
 
 TEST_F(FileDBTest, ARowTakesItsName) {

@@ -98,6 +98,35 @@ TEST_F(FileDBOpenTest, AFileThatWasBroughtToVersionTwoStaysThere) {
     EXPECT_EQ(1, m_db.GetFileInfoBySourcePath("/d", info));
 }
 
+TEST_F(FileDBOpenTest, TriggersOfAnEarlierProgramAreMadeAnew) {
+    RawDatabase(m_path).Run(
+        std::string(OLD_FORM) +
+        "CREATE TABLE unproven_table ( id INTEGER PRIMARY KEY, flush INTEGER NOT NULL );"
+        "CREATE TABLE flush_table ( id INTEGER PRIMARY KEY, flush INTEGER NOT NULL );"
+        "INSERT INTO flush_table VALUES (1, 7);"
+        "CREATE TRIGGER file_info_insert_trigger AFTER INSERT ON file_info_table"
+        " WHEN NEW.file_type = 0 BEGIN DELETE FROM unproven_table WHERE id = NEW.id;"
+        "  INSERT INTO unproven_table SELECT NEW.id, flush FROM flush_table; END;"
+        "CREATE TRIGGER file_info_update_trigger AFTER UPDATE ON file_info_table"
+        " WHEN NEW.file_type = 0 BEGIN DELETE FROM unproven_table WHERE id = NEW.id;"
+        "  INSERT INTO unproven_table SELECT NEW.id, flush FROM flush_table; END;");
+    ASSERT_EQ(0, m_db.Init(m_path));
+    EXPECT_EQ(0, m_db.SetFileInfoBySourcePath({"/new", "/new", FILE_INFO_DIR, 0, 0}));
+    EXPECT_EQ(0, m_db.SetFileInfoBySourcePath({"/d", "/elsewhere", FILE_INFO_DIR, 0, 0}));
+    RawDatabase raw(m_path);
+    EXPECT_EQ("/d|/new", raw.Read("SELECT source_path FROM file_info_table JOIN unproven_table "
+                                  "USING (id) ORDER BY source_path"));
+    EXPECT_EQ("2", raw.Read("SELECT COUNT(*) FROM sqlite_master WHERE type = 'trigger'"));
+}
+
+TEST_F(FileDBOpenTest, OpeningAgainChangesNoTable) {
+    ASSERT_EQ(0, m_db.Init(m_path));
+    m_db.Close();
+    const std::string before = RawDatabase(m_path).Read("PRAGMA schema_version");
+    ASSERT_EQ(0, m_db.Init(m_path));
+    EXPECT_EQ(before, RawDatabase(m_path).Read("PRAGMA schema_version"));
+}
+
 TEST_F(FileDBOpenTest, WhatIsNoDatabaseIsRefusedAndLeftAsItIs) {
     m_dir.Write("file-db.sqlite", std::string(5000, 'x'));
     EXPECT_EQ(-1, m_db.Init(m_path));

@@ -18,11 +18,30 @@ TEST_F(FileDBTest, WhatIsProvenStays) {
     EXPECT_NE("", BySource("/a"));
 }
 
-TEST_F(FileDBTest, FoldersNeedNoProof) {
+TEST_F(FileDBTest, AFolderThatWasMadeIsProvenLikeAFile) {
     SetDir("/a");
-    EXPECT_EQ(0U, m_db.UnprovenCount());
+    Reopen();
+    EXPECT_EQ("", BySource("/a"));
+    SetDir("/a");
+    EXPECT_EQ(0U, m_db.UnprovenCount()) << "no reason to flush";
+    ProveAll();
     Reopen();
     EXPECT_NE("", BySource("/a"));
+}
+
+TEST_F(FileDBTest, AFolderThatWasNotMadeNeedsNoProof) {
+    EXPECT_EQ(0, m_db.SetFileInfoBySourcePath({"/a", "", FILE_INFO_DIR, 0, 0}));
+    Reopen();
+    EXPECT_NE("", BySource("/a"));
+}
+
+TEST_F(FileDBTest, ARowDoesNotInheritTheDoubtOfOneThatHadItsId) {
+    Set("/a", "/a");
+    EXPECT_EQ(0, m_db.DoubtFileInfo("/a"));
+    EXPECT_EQ(0, m_db.RemoveFileInfoBySourcePath("/a"));
+    EXPECT_EQ(0, m_db.SetFileInfoBySourcePath({"/b", "", FILE_INFO_DIR, 0, 0}));
+    Reopen();
+    EXPECT_NE("", BySource("/b"));
 }
 
 TEST_F(FileDBTest, AChangedRowIsUnprovenAgain) {
@@ -102,6 +121,38 @@ TEST_F(FileDBTest, ADoubtDuringAFlushOutlivesIt) {
     EXPECT_EQ(0, m_db.ProveFileInfo(mark));
     Reopen();
     EXPECT_EQ("", Sources());
+}
+
+TEST_F(FileDBTest, ADoubtOutlivesEveryFlush) {
+    Set("/a", "/a");
+    ProveAll();
+    EXPECT_EQ(0, m_db.DoubtFileInfo("/a"));
+    Set("/b", "/b");
+    ProveAll();
+    ProveAll();
+    Reopen();
+    EXPECT_EQ("/b", Sources());
+}
+
+TEST_F(FileDBTest, ADoubtEndsWithTheProofOfTheRowThatIsWrittenAnew) {
+    Set("/a", "/a", 1);
+    EXPECT_EQ(0, m_db.DoubtFileInfo("/a"));
+    Set("/a", "/a", 2);
+    ProveAll();
+    Reopen();
+    EXPECT_EQ("/a /a 0 2 1000", BySource("/a"));
+}
+
+TEST_F(FileDBTest, ADoubtAloneIsNothingToFlush) {
+    Set("/a", "/a");
+    ProveAll();
+    EXPECT_EQ(0, m_db.DoubtFileInfo("/a"));
+    int64_t mark = 5;
+    EXPECT_EQ(0, m_db.GetUnprovenMark(mark));
+    EXPECT_EQ(0, mark);
+    Set("/b", "/b");
+    ProveAll();
+    EXPECT_EQ(0U, m_db.UnprovenCount());
 }
 
 TEST_F(FileDBTest, ARowOfAnotherProgramIsUnprovenToo) {
@@ -194,6 +245,7 @@ TEST_F(FileDBBatchTest, ATransactionThatTheDatabaseEndedIsBegunAnew) {
     SetInBatch("/a");
     EXPECT_EQ(-1, m_db.RemoveFileInfoBySourcePath("/a"));
     SetInBatch("/b");
+    EXPECT_TRUE(m_db.TakeRowLoss()) << "/a is told";
     EXPECT_EQ("0", CountOfOther()) << "within a batch again";
     EXPECT_EQ(0, m_db.EndBatch());
     EXPECT_EQ("/b", Sources());

@@ -136,6 +136,8 @@ TEST_F(FileDBTest, WhileClosedEveryOperationFails) {
     EXPECT_EQ(-1, m_db.ForgetUnproven());
     EXPECT_EQ(0U, m_db.UnprovenCount());
     EXPECT_EQ(0, m_db.UnprovenSeconds());
+    EXPECT_FALSE(m_db.TakeFlushFailure());
+    EXPECT_FALSE(m_db.TakeRowLoss());
 }
 
 TEST_F(FileDBTest, AFailedWriteIsLoggedAndLeavesNoTransactionBehind) {

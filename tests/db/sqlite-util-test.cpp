@@ -3,6 +3,11 @@
 #include <gtest/gtest.h>
 #include <sqlite3.h>
 #include <sys/stat.h>
+#include <unistd.h>
+
+#include <chrono>
+#include <memory>
+#include <thread>
 
 #include "db/raw-database.h"
 #include "support/log-capture.h"
@@ -45,6 +50,27 @@ TEST_F(SqliteUtilTest, OthersLoseTheRightToWriteToAnExistingFile) {
     ASSERT_EQ(DatabaseOpenResult::DONE, result.failed_step);
     EXPECT_EQ(0644u, ModeOf(path));
     EXPECT_EQ(0644u, ModeOf(path + "-wal"));
+    sqlite3_close_v2(result.db);
+}
+
+// sqlite does not wait for other connections there.
+TEST_F(SqliteUtilTest, AScriptThatLeavesTheLogModeWaitsForOthersAndNotForEver) {
+    const std::string path = m_dir / "x.sqlite";
+    auto other = std::make_unique<RawDatabase>(path);
+    other->Run(kScript);
+    const DatabaseOpenResult result = OpenDatabase(path, "");
+    ASSERT_EQ(DatabaseOpenResult::DONE, result.failed_step);
+    constexpr char leave[] = "SELECT COUNT(*) FROM t; PRAGMA journal_mode = DELETE;";
+    const auto start = std::chrono::steady_clock::now();
+    EXPECT_EQ(SQLITE_BUSY, RunSqlScript(result.db, leave, 50));
+    EXPECT_LE(std::chrono::milliseconds(50), std::chrono::steady_clock::now() - start);
+    std::thread program([&] {
+        LetOtherThreadMeetTheLock();
+        other.reset();
+    });
+    EXPECT_EQ(SQLITE_OK, RunSqlScript(result.db, leave, 60000));
+    program.join();
+    EXPECT_NE(0, access((path + "-wal").c_str(), F_OK));
     sqlite3_close_v2(result.db);
 }
 

@@ -56,6 +56,21 @@ TEST_F(DurableFileTest, AFailedWriteLeavesTheOldContent) {
     EXPECT_EQ(ENOENT, errno);
 }
 
+TEST_F(DurableFileTest, ARemovedFileIsGone) {
+    ASSERT_EQ(0, WriteDurableFile(m_path, "x"));
+    EXPECT_EQ(0, RemoveDurableFile(m_path));
+    EXPECT_NE(0, access(m_path.c_str(), F_OK));
+    EXPECT_EQ(0, RemoveDurableFile(m_path)) << "there is none";
+}
+
+TEST_F(DurableFileTest, WhatCannotBeRemovedIsAFailure) {
+    m_dir.MakeDir("record");
+    EXPECT_EQ(-1, RemoveDurableFile(m_path));
+    EXPECT_EQ(EISDIR, errno);
+    EXPECT_EQ(-1, RemoveDurableFile(m_dir / "no-folder/record"));
+    EXPECT_EQ(ENOENT, errno);
+}
+
 TEST_F(DurableFileTest, TheFileIsItsOwnersAlone) {
     ASSERT_EQ(0, WriteDurableFile(m_path, "x"));
     struct stat info {};

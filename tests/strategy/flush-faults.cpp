@@ -21,8 +21,11 @@ std::string PathOf(int fd) {
     return length < 0 ? std::string() : std::string(path, static_cast<size_t>(length));
 }
 
+int g_fd = -1;
+
 int Flush(const char* name, const std::string& prefix, int fd) {
     if (Action()) {
+        g_fd = fd;
         if (const int error = Action()(prefix + PathOf(fd)); error != 0) {
             errno = error;
             return -1;
@@ -36,6 +39,7 @@ int Flush(const char* name, const std::string& prefix, int fd) {
 extern "C" {
 
 int fsync(int fd) { return Flush("fsync", "", fd); }
+int fdatasync(int fd) { return Flush("fdatasync", "", fd); }
 int syncfs(int fd) noexcept { return Flush("syncfs", "fs:", fd); }
 
 }  // extern "C"
@@ -44,3 +48,4 @@ OnFlush::OnFlush(std::function<int(const std::string& what)> action) {
     Action() = std::move(action);
 }
 OnFlush::~OnFlush() { Action() = nullptr; }
+int OnFlush::Fd() { return g_fd; }

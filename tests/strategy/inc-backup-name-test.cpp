@@ -1,4 +1,5 @@
 // Under which name a file lands: the options, the time of the file, names that are taken.
+#include <cstdlib>
 #include <fstream>
 #include <sstream>
 
@@ -95,6 +96,17 @@ TEST_F(IncBackupNameTest, DatesAreLocalTimeOnBothSidesOfSummerTime) {
     EXPECT_EQ("/2024-01-01/2024-01-01_003000.jpg", Land("/5.jpg", 1704065400));
     SetTimeZone("UTC");
     EXPECT_EQ("/2023-12-31/2023-12-31_233000.jpg", Land("/6.jpg", 1704065400));
+}
+
+TEST_F(IncBackupNameTest, AZoneThatIsChangedBetweenRunsIsTakenUp) {
+    SetNaming(false, true, false);
+    WriteSrc("/1.jpg", "bytes", 1704065400);  // half an hour before the year ends in London
+    RunWell();
+    EXPECT_EQ("/2023-12-31/1.jpg", Recorded("/1.jpg"));
+    setenv("TZ", "XXX-9", 1);  // and nobody tells the C library
+    WriteSrc("/2.jpg", "bytes", 1704065400);
+    RunWell();
+    EXPECT_EQ("/2024-01-01/2.jpg", Recorded("/2.jpg"));
 }
 
 TEST_F(IncBackupNameTest, ATimeBefore1970HasItsDate) {

@@ -1,40 +1,13 @@
 // When the destination of an incremental task is flushed, and what becomes of its records then.
 #include "strategy/record-proof.h"
 
-#include <cerrno>
-
 #include "db/file-db.h"
 #include "event/event-manager.h"
-#include "flush-faults.h"
-#include "inc-backup-fixture.h"
+#include "record-proof-fixture.h"
+#include "time-faults.h"
 #include "utils/error-code.h"
 
 namespace {
-
-using testing::IsEmpty;
-
-class RecordProofTest : public IncBackupFixture {
-protected:
-    // Counts the flushes of a file system, which fail from the nth on.
-    int CountFlush(const std::string& what) {
-        if (!what.starts_with("fs:")) return 0;
-        return ++m_flushes >= m_first_failure && m_flushes <= m_last_failure ? EIO : 0;
-    }
-    void WriteFiles(int count) {
-        for (int n = 0; n < count; ++n) WriteSrc("/f" + std::to_string(n), "s");
-    }
-    // How many files have a record, also after a restart.
-    int Records(int count) {
-        int records = 0;
-        for (int n = 0; n < count; ++n) records += Recorded("/f" + std::to_string(n)) != "-";
-        return records;
-    }
-
-    int m_flushes = 0;
-    int m_first_failure = 1000000;
-    int m_last_failure = 1000000;
-    const OnFlush m_faults{[this](const std::string& what) { return CountFlush(what); }};
-};
 
 TEST_F(RecordProofTest, AShortRunIsFlushedOnceAtItsEnd) {
     WriteFiles(20);
@@ -50,6 +23,23 @@ TEST_F(RecordProofTest, ALongRunIsFlushedEverySomeHundredFiles) {
     EXPECT_EQ(3, m_flushes);
     ReopenFileDB();
     EXPECT_EQ(2100, Records(2100));
+}
+
+TEST_F(RecordProofTest, ASlowRunIsFlushedEveryHalfMinute) {
+    for (const auto& [seconds, flushes] : {std::pair(20, 1), std::pair(30, 2)}) {
+        MonotonicShift clock;
+        WriteSrc("/f1", "s", 1000 + seconds);
+        WriteSrc("/f2", "s", 1000 + seconds);
+        WriteSrc("/f3", "s", 1000 + seconds);
+        TakeCopies();
+        m_flushes = 0;
+        m_fake.OnCall("KELDFileCopy_r", [&, wait = seconds] {
+            if (m_fake.CallCount("KELDFileCopy_r") == 2) clock.Advance(wait);
+        });
+        RunWell();
+        EXPECT_EQ(flushes, m_flushes) << seconds;
+        m_fake.OnCall("KELDFileCopy_r", [] {});
+    }
 }
 
 TEST_F(RecordProofTest, ACrashLosesOnlyWhatWasNotFlushed) {
@@ -120,26 +110,50 @@ TEST_F(RecordProofTest, ADestinationDeviceThatIsPulledLosesItsRecords) {
     EXPECT_EQ(0, Records(10));
 }
 
+TEST_F(RecordProofTest, ADestinationShareThatGoesWithTheDeviceLosesItsRecords) {
+    WriteFiles(10);
+    m_fake.OnCall("KELDFileCopy_r", [this] {
+        if (m_fake.CallCount("KELDFileCopy_r") < 10) return;
+        m_fake.Pull(m_usb);
+        m_fake.LockShare("photos");
+    });
+    EXPECT_EQ(ERR_SRC_ROOT_MISS, RunTask());
+    EXPECT_EQ(0, Records(10));
+}
+
+TEST_F(RecordProofTest, AFlushIsNotBelievedWhenTheShareHasGoneWithTheDevice) {
+    EXPECT_EQ(0, m_task.file_db->SetFileInfoBySourcePath({"/f0", "/f0", FILE_INFO_FILE, 1, 1}));
+    for (int n = 1; n < 1000; ++n) {
+        const std::string path = "/f" + std::to_string(n);
+        EXPECT_EQ(0, m_task.file_db->SetFileInfoBySourcePath({path, path, FILE_INFO_FILE, 1, 1}));
+    }
+    m_fake.Pull(m_usb);
+    m_fake.LockShare("photos");
+    EXPECT_EQ(0, FlushRecordsIfDue(m_task));
+    EXPECT_TRUE(TakeFlushFailure(m_task)) << "the run fails, and not the file";
+    EXPECT_EQ(0, Records(1000));
+}
+
 TEST_F(RecordProofTest, OnlyWhatWasWrittenBeforeTheFlushIsProven) {
     EXPECT_EQ(0, m_task.file_db->SetFileInfoBySourcePath({"/f0", "/f0", FILE_INFO_FILE, 1, 1}));
     RecordProof proof(m_task);
     EXPECT_EQ(0, m_task.file_db->SetFileInfoBySourcePath({"/f1", "/f1", FILE_INFO_FILE, 1, 1}));
-    proof.Settle(true);
+    EXPECT_EQ(0, proof.Settle(true));
     ReopenFileDB();
     EXPECT_EQ("/f0", Recorded("/f0"));
     EXPECT_EQ("-", Recorded("/f1"));
 }
 
 TEST_F(RecordProofTest, AFlushFailureIsTakenOnce) {
-    RecordProof(m_task).Settle(false);
+    EXPECT_EQ(0, RecordProof(m_task).Settle(false));
     EXPECT_TRUE(TakeFlushFailure(m_task));
     EXPECT_FALSE(TakeFlushFailure(m_task));
 }
 
 TEST_F(RecordProofTest, ATaskWithoutAFileDatabaseHasNothingToProve) {
     m_task.file_db.reset();
-    RecordProof(m_task).Settle(true);
-    RecordProof(m_task).Settle(false);
+    EXPECT_EQ(0, RecordProof(m_task).Settle(true));
+    EXPECT_EQ(0, RecordProof(m_task).Settle(false));
     EXPECT_EQ(0, FlushRecordsIfDue(m_task));
     EXPECT_FALSE(TakeFlushFailure(m_task));
     EndRecords(m_task);
@@ -148,7 +162,7 @@ TEST_F(RecordProofTest, ATaskWithoutAFileDatabaseHasNothingToProve) {
 
 TEST_F(RecordProofTest, WhatCannotBeSettledIsTold) {
     m_task.file_db->Close();
-    RecordProof(m_task).Settle(false);
+    EXPECT_EQ(ERR_SYSTEM, RecordProof(m_task).Settle(false));
     EXPECT_TRUE(m_log.Has("[WARN] Copies of task '7' will be made again"));
     EndRecords(m_task);
     EXPECT_TRUE(m_log.Has("[WARN] Names of moved files of task '7' stay taken"));

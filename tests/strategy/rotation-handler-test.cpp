@@ -12,11 +12,12 @@
 #include "db/log-db.h"
 #include "db/task-info.h"
 #include "filter/file-filter.h"
+#include "listing-faults.h"
 #include "naive-rotation.h"
 #include "platform/utility.h"
+#include "rotation-fixture.h"
 #include "strategy/version-end.h"
 #include "utils/error-code.h"
-#include "version-fixture.h"
 
 namespace fs = std::filesystem;
 
@@ -26,8 +27,6 @@ using testing::ElementsAre;
 using testing::IsEmpty;
 using testing::SizeIs;
 
-constexpr uint32_t NOW = 1717243200;  // 2024-06-01 12:00 UTC
-
 std::string NameAt(time_t seconds) {
     tm local{};
     std::string name;
@@ -36,28 +35,7 @@ std::string NameAt(time_t seconds) {
     return name;
 }
 
-class RotationHandlerTest : public VersionFixture {
-protected:
-    RotationHandlerTest() {
-        m_task.enable_rotation = true;
-        m_task.max_version_count = 2;
-    }
-    int Rotate(uint32_t now = NOW) {
-        RotationHandler rotation(now);
-        rotation.Init(m_task);
-        rotation.SetAbortFlag(&m_abort);
-        return rotation.Run();
-    }
-    void MakeMay(std::initializer_list<const char*> days) {
-        for (const char* day : days) MakeVersion(May(day));
-    }
-    static std::string May(const std::string& day) {
-        return "Ferrix Copy_2024-05-" + day.substr(0, 2) + "_100000" + day.substr(2);
-    }
-    void EnableBin() { m_fake.AddShare({.name = "photos", .path = m_share, .recycle_bin = true}); }
-
-    TimeZone m_zone{"UTC"};
-};
+class RotationHandlerTest : public RotationFixture {};
 
 TEST_F(RotationHandlerTest, TheOldestVersionsGoAndEachIsLogged) {
     MakeMay({"01", "02", "03", "04"});
@@ -105,7 +83,7 @@ TEST_F(RotationHandlerTest, BadVersionsGoFirst) {
 TEST_F(RotationHandlerTest, WhatIsNoVersionIsNeitherCountedNorRemoved) {
     MakeMay({"01", "02"});
     const std::string others[] = {"Ferrix Copy_2024-03-09_141502.old", "mine",
-                                  "Ferrix Copy_2024-3-9_141502", "Ferrix Copy_2024-02-31_141502"};
+                                  "Ferrix Copy_2024-13-09_141502", "ferrix copy_2024-03-09_141502"};
     for (const std::string& name : others) MakeVersion(name);
     EXPECT_EQ(0, Rotate());
     EXPECT_THAT(Versions(), SizeIs(6));
@@ -116,6 +94,16 @@ TEST_F(RotationHandlerTest, WhatIsNoVersionIsNeitherCountedNorRemoved) {
     EXPECT_EQ(0, Rotate());
     EXPECT_THAT(Versions(), SizeIs(5));
     EXPECT_FALSE(IsThere(Dst("/" + May("01"))));
+}
+
+TEST_F(RotationHandlerTest, ANameThatTellsATimeIsAVersionHoweverItIsWritten) {
+    MakeMay({"01", "02"});
+    MakeVersion("Ferrix Copy_2024-3-9_141502");
+    MakeVersion("Ferrix Copy_2024-02-31_141502");  // the 2nd of March
+    EXPECT_EQ(0, Rotate());
+    EXPECT_THAT(Versions(), ElementsAre(May("01"), May("02")));
+    EXPECT_THAT(RotatedRows(), ElementsAre("[\"holiday\",\"Ferrix Copy_2024-02-31_141502\"]",
+                                           "[\"holiday\",\"Ferrix Copy_2024-3-9_141502\"]"));
 }
 
 TEST_F(RotationHandlerTest, AFileWithTheNameOfAVersionIsTreatedAlike) {
@@ -322,6 +310,34 @@ TEST_F(RotationHandlerTest, AnAbortEndsItBeforeTheListAndBetweenVersions) {
     EXPECT_THAT(Versions(), ElementsAre(May("02"), May("03"), May("04")))
         << "the version in hand is removed to its end";
     EXPECT_FALSE(IsThere(MarksPath()));
+}
+
+TEST_F(RotationHandlerTest, AnAbortEndsItBehindTheListing) {
+    MakeMay({"01", "02", "03", "04"});
+    // The marks, for which the repository is asked, are read behind the listing.
+    m_fake.OnCall("KLIBCFileGetKeyValue", [this] { m_abort = 1; });
+    EXPECT_EQ(ERR_INTERRUPTED, Rotate());
+    EXPECT_TRUE(m_log.Has("[WARN] SetVersionList: user stopped"));
+    EXPECT_TRUE(m_log.Has("[ERR] Failed to SetVersionList"));
+    EXPECT_THAT(Versions(), SizeIs(4));
+}
+
+TEST_F(RotationHandlerTest, AFolderThatCannotBeListedToItsEndIsAnIoError) {
+    MakeMay({"01", "02", "03", "04"});
+    {
+        const BreakListing broken(4);
+        EXPECT_EQ(ERR_IO, Rotate()) << "and no interrupted run, which would be done again for ever";
+    }
+    EXPECT_TRUE(m_log.Has("[ERR] interrupted while get dst file list '" + Dst() + "'"));
+    EXPECT_THAT(Versions(), SizeIs(4));
+}
+
+TEST_F(RotationHandlerTest, WithMarksThatCannotBeReadNothingGoes) {
+    MakeMay({"01", "02", "03", "04"});
+    fs::create_directory(MarksPath());
+    EXPECT_EQ(ERR_SYSTEM, Rotate()) << "one of them may be the version that a run is filling";
+    EXPECT_THAT(Versions(), SizeIs(4));
+    EXPECT_TRUE(m_log.Has("[ERR] Failed to SetVersionList"));
 }
 
 TEST_F(RotationHandlerTest, AVersionThatIsBeingFilledIsNoneYet) {

@@ -1,36 +1,19 @@
 #include "strategy/scan-handler.h"
 
-#include <dirent.h>
-#include <dlfcn.h>
 #include <fcntl.h>
 #include <gmock/gmock.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <atomic>
-#include <cerrno>
 
 #include "event/event-manager.h"
 #include "filter/file-filter.h"
+#include "listing-faults.h"
 #include "platform/unproven-run.h"
 #include "strategy-fixture.h"
 #include "utils/error-code.h"
 #include "utils/file-list.h"
-
-// Stands in for the system's call in this program, so that a folder can break in the middle of its
-// listing as on a dying disk.
-namespace {
-std::atomic<int> g_entries_until_error{-1};  // below 0: no error
-}  // namespace
-extern "C" struct dirent* readdir(DIR* dir) {
-    static const auto real = reinterpret_cast<struct dirent* (*)(DIR*)>(
-        dlsym(RTLD_NEXT, sizeof(off_t) == sizeof(long) ? "readdir" : "readdir64"));
-    if (g_entries_until_error.load() >= 0 && g_entries_until_error.fetch_sub(1) == 0) {
-        errno = EIO;
-        return nullptr;
-    }
-    return real(dir);
-}
 
 namespace {
 
@@ -280,11 +263,10 @@ TEST_F(ScanHandlerTest, AFolderThatBreaksInTheMiddleOfItsListingIssuesNothing) {
     // Each side lists ".", ".." and its entries, and the end: 6 calls for the source, 7 for the
     // rest.
     for (int n = 0; n < 13; ++n) {
-        g_entries_until_error = n;
+        const BreakListing broken(n);
         EXPECT_EQ(ERR_IO, HandleScan("/")) << "at entry " << n;
         EXPECT_THAT(TakeIssued(), IsEmpty()) << "at entry " << n;
     }
-    g_entries_until_error = -1;
     EXPECT_EQ(0, HandleScan("/"));
     EXPECT_THAT(TakeIssued(), ElementsAre("remove /d"));
 }
@@ -409,10 +391,9 @@ TEST_F(ScanHandlerTest, AListingThatBreaksOffBecauseTheDeviceIsGoneIsNotRetried)
     m_fake.Pull(m_usb);
     // At the source, and at the destination behind the whole source: ".", "..", "a" and the end.
     for (const int n : {0, 4}) {
-        g_entries_until_error = n;
+        const BreakListing broken(n);
         EXPECT_EQ(ERR_SRC_ROOT_MISS, HandleScan("/")) << "at entry " << n;
     }
-    g_entries_until_error = -1;
     EXPECT_TRUE(m_log.Has("[ERR] ScanHandler: Failed to get src list '" + Src() + "'"));
     EXPECT_TRUE(m_log.Has("[ERR] ScanHandler: Failed to get dst list '" + Src() + "'"));
     EXPECT_EQ(ERROR_ACTION_DONE, ErrorActionOf(ERR_SRC_ROOT_MISS));

@@ -205,6 +205,18 @@ TEST_F(TaskHandlerTest, ABrokenOffRunWithoutItsDestinationLeavesAllUnproven) {
     EXPECT_EQ("0 0 1\n", ReadWholeFile(RecordPath()));
 }
 
+TEST_F(TaskHandlerTest, ABrokenOffRunWithoutItsDeviceAndItsShareLeavesAllUnproven) {
+    m_handler.m_work = [this] {
+        m_dir.Write("volume1/@Ferrix/task/7/unproven-run", "0 0 1\n");
+        PushPendingEvent();
+        m_fake.Pull(m_usb);
+        m_fake.LockShare("photos");
+        m_abort = 1;
+    };
+    EXPECT_EQ(ERR_INTERRUPTED, Run());
+    EXPECT_EQ("0 0 1\n", ReadWholeFile(RecordPath()));
+}
+
 TEST_F(TaskHandlerTest, AMirrorNeverRotates) {
     m_task.enable_rotation = true;
     m_task.max_version_count = 1;
@@ -321,6 +333,28 @@ TEST_F(TaskHandlerTest, ADestinationDeviceThatIsGoneAtTheEndLeavesItsCopiesUnpro
     };
     EXPECT_EQ(ERR_DST_ROOT_MISS, Run());
     EXPECT_TRUE(IsThere(RecordPath()));
+}
+
+TEST_F(TaskHandlerTest, AShareThatIsGoneWithTheDeviceLeavesItsCopiesUnproven) {
+    WriteSrc("/a", "x");
+    m_handler.m_work = [this] {
+        m_failures = DrainEvents();
+        m_fake.Pull(m_usb);
+        m_fake.LockShare("photos");
+    };
+    EXPECT_EQ(ERR_SRC_ROOT_MISS, Run());
+    EXPECT_TRUE(IsThere(RecordPath()));
+}
+
+TEST_F(TaskHandlerTest, AnExportWhoseShareIsGoneHasItsCopiesOnTheDisk) {
+    MakeExport();
+    WriteSrc("/a", "x");
+    m_handler.m_work = [this] {
+        m_failures = DrainEvents();
+        m_fake.LockShare("photos");
+    };
+    EXPECT_EQ(ERR_SHARE_NOT_MOUNTED, Run());
+    EXPECT_FALSE(IsThere(RecordPath()));
 }
 
 // However late the device goes, not one file of the copy is removed for it; and the run is no good

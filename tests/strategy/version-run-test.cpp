@@ -178,6 +178,50 @@ TEST_F(VersionRunTest, AFailedRotationFailsTheRunAndLeavesItsVersion) {
     EXPECT_FALSE(IsThere(MarksPath()));
 }
 
+TEST_F(VersionRunTest, ARunThatFillsTheDestinationRotatesNothing) {
+    WriteSrc("/a", "bytes");
+    WriteSrc("/b", "bytes");
+    MakeVersion("Ferrix Copy_2020-01-01_000000");
+    m_task.enable_rotation = true;
+    m_task.max_version_count = 1;
+    for (const int error : {int{KELDERR_NO_SPACE}, int{KELDERR_QUOTA_FULL}}) {
+        m_log.Clear();
+        m_fake.FailCall("KELDFileCopy_r", error, FakeKeld::ALWAYS);
+        EXPECT_EQ(0, Run());
+        EXPECT_EQ(ERR_DST_QUOTA_FULL, Ferrix::ErrorHandler::GetInstance().Get(TASK_ID));
+        EXPECT_THAT(Versions(), ElementsAre("Ferrix Copy_2020-01-01_000000", RUN_DIR));
+        EXPECT_TRUE(m_log.Has("[WARN] The destination of task '7' is full, no version is removed"));
+        EXPECT_FALSE(IsThere(MarksPath()));
+        fs::remove_all(Run1());
+    }
+    m_fake.FailCall("KELDFileCopy_r", 0, 0);
+    EXPECT_EQ(0, Run(SECOND_DIR));
+    EXPECT_THAT(Versions(), ElementsAre(SECOND_DIR));
+}
+
+TEST_F(VersionRunTest, ARunWithAnotherFailedFileRotates) {
+    WriteSrc("/a", "bytes");
+    WriteSrc("/b", "bytes");
+    MakeVersion("Ferrix Copy_2020-01-01_000000");
+    m_task.enable_rotation = true;
+    m_task.max_version_count = 1;
+    m_fake.FailCall("KELDFileCopy_r", KELDERR_NO_PERMISSION);
+    EXPECT_EQ(0, Run());
+    EXPECT_THAT(Versions(), ElementsAre(RUN_DIR));
+}
+
+TEST_F(VersionRunTest, AMarkThatStaysDoesNotFailAGoodRun) {
+    WriteSrc("/a", "bytes");
+    m_handler.m_work = [this] {
+        DrainEvents();
+        fs::remove(MarksPath());
+        fs::create_directory(MarksPath());
+    };
+    EXPECT_EQ(0, Run());
+    EXPECT_THAT(Versions(), ElementsAre(RUN_DIR));
+    EXPECT_TRUE(m_log.Contains("gets a bad name when the task is loaded"));
+}
+
 // --- Runs that were broken off ---
 
 TEST_F(VersionRunTest, AnInterruptedRunGetsABadName) {
