@@ -9,5 +9,9 @@
 #include <string>
 
 // True when the repository lies on `to`, and the settings say so. What lies in its place there is
-// kept in the folder "@tmp" of that volume. False (logged): it lies on `from`, if it did before.
+// kept in the folder "@tmp" of that volume. When the settings name `to` already, as after a move
+// that was killed at its end, the repository there is the one in use: then what lies on `from` is
+// kept aside on that volume instead.
+// False (logged): the repository lies where the settings say, which is where they said before, or
+// on `to` when the old one could not be put away whole. One folder under two names is refused.
 [[nodiscard]] bool MoveRepoData(const std::string& from, const std::string& to);

@@ -1,11 +1,11 @@
 #include "service/repository.h"
 
 #include <json/value.h>
+#include <json/writer.h>
 #include <sys/stat.h>
 
 #include "platform/durable-file.h"
 #include "platform/global-setting.h"
-#include "platform/json-util.h"
 #include "platform/package-paths.h"
 #include "utils/file-op.h"
 #include "utils/log.h"
@@ -13,6 +13,7 @@
 namespace {
 
 constexpr mode_t LIST_MODE = 0644;
+constexpr size_t MAX_VOLUME_SIZE = 63;  // the settings cut off what is longer
 
 bool IsUsable(const std::string& volume) {
     struct stat info = {};
@@ -30,11 +31,17 @@ bool MakeFolder(const std::string& path) {
 }
 
 // The list that the package manager reads to know which volumes the package needs.
-int WriteVolumeList(const std::string& volume) {
+std::string VolumeListPath() { return PackagePath("/etc/keldpkg_conf/reg_volume"); }
+
+std::string VolumeListText(const std::string& volume) {
     Json::Value list(Json::arrayValue);
     if (!volume.empty()) list.append(volume);
-    const std::string path = PackagePath("/etc/keldpkg_conf/reg_volume");
-    if (MakeFolder(PathDirName(path)) && WriteDurableFile(path, WriteJson(list) + "\n") == 0 &&
+    return Json::FastWriter().write(list);
+}
+
+int WriteVolumeList(const std::string& volume) {
+    const std::string path = VolumeListPath();
+    if (MakeFolder(PathDirName(path)) && WriteDurableFile(path, VolumeListText(volume)) == 0 &&
         chmod(path.c_str(), LIST_MODE) == 0) {
         return 0;
     }
@@ -69,6 +76,19 @@ int MakeRepo(const std::string& volume) {
     return 0;
 }
 
+bool CanBeRegistered(const std::string& volume) {
+    if (volume.size() <= MAX_VOLUME_SIZE) return true;
+    SLOG_ERR("The path of volume '%s' is too long\n", volume.c_str());
+    return false;
+}
+
 int RegisterVolume(const std::string& volume) {
-    return SetRepoVolPath(volume) ? WriteVolumeList(volume) : -1;
+    if (!CanBeRegistered(volume) || !SetRepoVolPath(volume)) return -1;
+    return WriteVolumeList(volume);
+}
+
+void UpdateVolumeList(const std::string& volume) {
+    std::string text;
+    const int found = ReadDurableFile(VolumeListPath(), text);
+    if (found <= 0 || text != VolumeListText(volume)) (void)!WriteVolumeList(volume);
 }

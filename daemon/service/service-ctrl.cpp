@@ -1,10 +1,5 @@
 #include "service/service-ctrl.h"
 
-#include <sys/stat.h>
-#include <unistd.h>
-
-#include <cerrno>
-#include <csignal>
 #include <utility>
 
 #include "daemon/process-shell.h"
@@ -14,18 +9,18 @@
 #include "platform/sdk-service.h"
 #include "platform/service-status.h"
 #include "service/daemon-end.h"
+#include "service/daemon-start.h"
+#include "service/repo-finder.h"
 #include "service/repo-move.h"
 #include "service/repository.h"
 #include "service/service-lock.h"
 #include "service/usable-volume.h"
 #include "updater/updater-core.h"
 #include "utils/log.h"
-#include "utils/path-util.h"
 
 namespace {
 
 constexpr char SYSTEM_ERROR[] = "err_sys";
-constexpr int WAIT_STEP_MS = 10;
 
 int SetState(int state) { return SetServiceStatus({state, ""}); }
 
@@ -48,15 +43,6 @@ int WaitForVolume() {
         result = -1;
     }
     return RegisterVolume("") < 0 ? -1 : result;
-}
-
-// The same folder under two names would be moved onto itself.
-bool IsSameFolder(const std::string& a, const std::string& b) {
-    if (PathWithoutTrailingSlashes(a) == PathWithoutTrailingSlashes(b)) return true;
-    struct stat first = {};
-    struct stat second = {};
-    return stat(a.c_str(), &first) == 0 && stat(b.c_str(), &second) == 0 &&
-           first.st_dev == second.st_dev && first.st_ino == second.st_ino;
 }
 
 int MoveFiles(const std::string& from, const std::string& to) {
@@ -107,37 +93,12 @@ bool ServiceCtrl::IsRunning() const {
 int ServiceCtrl::StartLocked() {
     if (!SDK::FileExists(PackagePath("/enabled"))) return 0;
     if (IsRunning()) return 0;
-    std::string volume = GetRepoVolPath();
-    if (!IsVolumeMounted(volume)) {
-        SLOG_INFO("%s:%d Ferrix Copy repo NOT mounted '%s'", __FILE__, __LINE__, volume.c_str());
-        const int found = FindRepository(volume);
-        if (found == 0 && volume.empty()) return WaitForVolume();
-        if (found < 0) volume.clear();
-    }
-    if (!volume.empty() && StartOn(volume) == 0) return 0;
+    std::string volume;
+    const int found = FindRepository(volume);
+    if (found == 0) return WaitForVolume();
+    if (found > 0 && StartOn(volume) == 0) return 0;
     EnterErrorState();
     return -1;
-}
-
-// Another volume takes the place of one that is not there. Empty when there is none.
-int ServiceCtrl::FindRepository(std::string& volume) {
-    const std::string old_volume = std::exchange(volume, FindUsableVolume());
-    return volume.empty() ? 0 : ReplaceRepository(old_volume, volume);
-}
-
-int ServiceCtrl::ReplaceRepository(const std::string& old_volume, const std::string& volume) {
-    if (old_volume.empty()) {
-        if (MakeRepo(volume) < 0) return -1;
-        SLOG_NOTICE("%s:%d Repo volume was empty, create default repo volume as [%s].", __FILE__,
-                    __LINE__, volume.c_str());
-    } else {
-        // What cannot be reached any more cannot be moved: the service goes on with a repository
-        // that has no tasks yet.
-        (void)!MoveRepoData(old_volume, volume);
-        SLOG_NOTICE("%s:%d Repo volume [%s] was not valid, create new repo volume as [%s].",
-                    __FILE__, __LINE__, old_volume.c_str(), volume.c_str());
-    }
-    return RegisterVolume(volume);
 }
 
 int ServiceCtrl::StartOn(const std::string& volume) {
@@ -152,7 +113,7 @@ int ServiceCtrl::StartOn(const std::string& volume) {
         return LogFailure("fail to run updater");
     }
     if (!ShowAllSchedule()) return LogFailure("fail to ShowAllSchedule");
-    if (RunDaemon() < 0) return LogFailure("fail to run daemon");
+    if (StartDaemon(m_places) < 0) return LogFailure("fail to run daemon");
     SDK::AddBoxLog(SDK::BoxEvent::SERVICE_STARTED);
     return 0;
 }
@@ -164,29 +125,9 @@ int ServiceCtrl::PrepareEnvironment(const std::string& volume) {
     return -1;
 }
 
-int ServiceCtrl::RunDaemon() {
-    if (SDK::RunProgram(PackagePath("/target/sbin/ferrixd"), {}) != 0) {
-        SLOG_ERR("Failed to start daemon\n");
-        return -1;
-    }
-    WaitForDaemon();
-    return 0;
-}
+int ServiceCtrl::StopLocked() { return EndDaemon(m_places) < 0 ? -1 : FinishStop(); }
 
-// The program ends before the daemon that it has become can be found. Whoever looks for it next
-// would start a second one.
-void ServiceCtrl::WaitForDaemon() const {
-    for (int waited = 0; waited < m_places.start_wait_ms; waited += WAIT_STEP_MS) {
-        if (access(m_places.pid_file.c_str(), F_OK) == 0) {
-            const pid_t pid = SDK::ReadPidFile(m_places.pid_file);
-            if (pid > 1 && kill(pid, 0) == 0) return;
-        }
-        usleep(WAIT_STEP_MS * 1000);
-    }
-}
-
-int ServiceCtrl::StopLocked() {
-    if (EndDaemon(m_places) < 0) return -1;
+int ServiceCtrl::FinishStop() {
     int result = 0;
     if (!HideAllSchedule()) result = LogFailure("fail to HideAllSchedule");
     if (SetState(SERVICE_STATE_STOPPED) < 0) {
@@ -196,21 +137,35 @@ int ServiceCtrl::StopLocked() {
     return result;
 }
 
+// A daemon that could not be stopped goes on as if nothing had been asked. One that has ended,
+// where more was to be done, leaves a service that is down without having been stopped in order.
+bool ServiceCtrl::StopForMove() {
+    if (!IsRunning()) return true;
+    if (EndDaemon(m_places) == 0) {
+        if (FinishStop() == 0) return true;
+        EnterErrorState();
+    }
+    SLOG_ERR("%s:%d failed to StopService()", __FILE__, __LINE__);
+    return false;
+}
+
 bool ServiceCtrl::MoveLocked(const std::string& from, const std::string& to) {
     if (to.empty()) {
         SLOG_ERR("%s:%d error: to_volume is empty", __FILE__, __LINE__);
         return false;
     }
     if (IsSameFolder(from, to)) return true;
-    if (IsRunning() && StopLocked() < 0) {
-        SLOG_ERR("%s:%d failed to StopService()", __FILE__, __LINE__);
+    if (!CanBeRegistered(to) || !IsVolumeWritable(to)) {
+        SLOG_ERR("The repository cannot be moved to '%s'\n", to.c_str());
         return false;
     }
+    if (!StopForMove()) return false;
     if (MoveFiles(from, to) < 0) {
         EnterErrorState();
         return false;
     }
-    if (RegisterVolume(to) < 0 || StartLocked() < 0) {
+    // A start may have found another volume in place of one that has gone meanwhile.
+    if (RegisterVolume(to) < 0 || StartLocked() < 0 || !IsSameFolder(GetRepoVolPath(), to)) {
         SLOG_ERR("%s:%d failed to StartService()", __FILE__, __LINE__);
         EnterErrorState();
         return false;

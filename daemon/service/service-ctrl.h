@@ -18,12 +18,14 @@ public:
     // used, which leaves the state WAITING. -1 (logged) leaves the state ERROR.
     [[nodiscard]] int StartService();
 
-    // 0 when the daemon has ended, by force if need be; -1 (logged), as when none runs.
+    // 0 when the daemon has ended, by force if need be; -1 (logged), as when none runs, or when the
+    // end could not be told to everybody.
     [[nodiscard]] int StopService();
 
     // Moves the repository to the volume `to` and starts the service there; an empty `from` makes a
-    // new one. The same volume is a success and changes nothing. False (logged) leaves the state
-    // ERROR once the daemon has been stopped, and a whole repository where the settings say.
+    // new one. The same volume is a success and changes nothing; one that is not mounted or not
+    // writable is refused. False (logged) leaves the state ERROR once the daemon has been stopped,
+    // and a whole repository where the settings say.
     [[nodiscard]] bool MoveRepoVolume(const std::string& from, const std::string& to);
 
 private:
@@ -32,12 +34,10 @@ private:
     int StopLocked();
     bool MoveLocked(const std::string& from, const std::string& to);
 
-    int FindRepository(std::string& volume);
-    int ReplaceRepository(const std::string& old_volume, const std::string& volume);
     int StartOn(const std::string& volume);
     int PrepareEnvironment(const std::string& volume);
-    int RunDaemon();
-    void WaitForDaemon() const;
+    int FinishStop();
+    bool StopForMove();
     [[nodiscard]] bool IsRunning() const;
 
     ServicePlaces m_places;

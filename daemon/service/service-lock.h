@@ -1,5 +1,5 @@
-// Keeps control programs from starting, stopping or moving the service at the same time. It ends
-// with the process, however that ends.
+// Keeps control programs from starting, stopping or moving the service at the same time, and from
+// reading its database meanwhile. It ends with the process, however that ends.
 #pragma once
 
 #include "utils/unique-fd.h"

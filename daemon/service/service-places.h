@@ -10,6 +10,6 @@ struct ServicePlaces {
     std::string pid_file = "/var/run/ferrixd.pid";
     std::string socket_path = DaemonIPC::SOCKET_PATH;
     BoxConfigPaths box_config{};
-    int kill_wait_ms = 1000;   // between two looks at a daemon that is to end, ten times
-    int start_wait_ms = 3000;  // at most, until a daemon that was started has its pid file
+    int kill_wait_ms = 1000;    // between two looks at a daemon that is to end, ten times
+    int start_wait_ms = 10000;  // at most, until a daemon that was started runs or has ended
 };

@@ -9,6 +9,7 @@
 #include "db/task-db.h"
 #include "platform/global-setting.h"
 #include "service/repository.h"
+#include "service/service-lock.h"
 #include "utils/file-op.h"
 #include "utils/log.h"
 
@@ -60,6 +61,7 @@ Json::Value ReportDevice(const USBInfo& usb, const std::list<TaskInfo>& tasks) {
 }  // namespace
 
 int PrintUsageReport() {
+    const ServiceLock lock;
     TaskDB db;
     if (OpenDatabase(db) < 0) return -1;
     std::list<USBInfo> devices;

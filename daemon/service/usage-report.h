@@ -3,5 +3,6 @@
 #pragma once
 
 // Prints the report to standard output. 0 or -1 (logged, and nothing printed), as when there is no
-// repository yet. Threads: one control program at a time; the daemon may run.
+// repository yet. Waits for the operation of another control program, since an upgrade puts another
+// database in place of the one that it would read; the daemon may run.
 [[nodiscard]] int PrintUsageReport();

@@ -4,6 +4,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <climits>
 #include <csignal>
 #include <fstream>
 
@@ -14,8 +15,8 @@
 
 namespace {
 
-// Serves one client after the other until one says "stop".
-void Serve(IPCListener& listener) {
+// Serves one client after the other until one says "stop", and means it.
+void Serve(IPCListener& listener, ChildDaemon::Manner manner) {
     for (;;) {
         if (!listener.Wait()) continue;
         Channel channel(Channel::DEFAULT_CAPACITY);
@@ -23,12 +24,20 @@ void Serve(IPCListener& listener) {
         PObject request;
         if (channel.Open(listener.Accept(), true) < 0 || stream.Recv(channel, request) < 0)
             continue;
+        if (manner == ChildDaemon::IGNORES_STOP) continue;
         if (request["action"].AsString() == "stop" && !request["need_ack"].AsBool()) return;
     }
 }
 
+// As the daemon does: among what a control program has open is its lock.
+void CloseAllBut(int fd) {
+    if (fd > 3) close_range(3, static_cast<unsigned>(fd) - 1, 0);
+    close_range(static_cast<unsigned>(fd) + 1, UINT_MAX, 0);
+}
+
 [[noreturn]] void RunChild(const std::string& pid_file, ChildDaemon::Manner manner,
                            const std::string& socket_path, int ready_fd) {
+    CloseAllBut(ready_fd);
     signal(SIGTERM, manner == ChildDaemon::IGNORES_SIGTERM ? SIG_IGN : SIG_DFL);
     IPCListener listener;
     const bool listens = !socket_path.empty() && listener.Listen(socket_path) == 0;
@@ -37,7 +46,7 @@ void Serve(IPCListener& listener) {
     if (!listens) {
         for (;;) pause();
     }
-    Serve(listener);
+    Serve(listener, manner);
     unlink(pid_file.c_str());
     _exit(0);
 }

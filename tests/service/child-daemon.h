@@ -1,5 +1,5 @@
 // A process that stands for the daemon: it has a pid file, may listen for "stop", and ends at
-// SIGTERM or does not care.
+// SIGTERM and "stop" or does not care for one of them.
 #pragma once
 
 #include <sys/types.h>
@@ -8,7 +8,7 @@
 
 class ChildDaemon {
 public:
-    enum Manner { ENDS_AT_SIGTERM, IGNORES_SIGTERM };
+    enum Manner { ENDS_AT_SIGTERM, IGNORES_SIGTERM, IGNORES_STOP };
 
     // Without a socket path it does not listen.
     ChildDaemon(const std::string& pid_file, Manner manner, const std::string& socket_path = "");

@@ -1,8 +1,10 @@
 #include "service/daemon-end.h"
 
+#include <sys/time.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <chrono>
 #include <csignal>
 
 #include "service/child-daemon.h"
@@ -71,6 +73,43 @@ TEST_F(DaemonEndTest, WithoutADaemonItFails) {
         EXPECT_EQ(-1, End()) << text;
     }
     EXPECT_EQ(5, m_log.Count("[ERR] Failed to kill daemon"));
+}
+
+// The pid file says that it has ended, the socket that it has not.
+TEST_F(DaemonEndTest, ADaemonWhosePidFileIsLostIsNotTakenForDead) {
+    ChildDaemon daemon(m_pid_file, ChildDaemon::IGNORES_STOP, m_dir / "socket");
+    fs::remove(m_pid_file);
+    EXPECT_EQ(-1, End());
+    EXPECT_FALSE(m_log.Has(NOT_ASKED));
+    EXPECT_FALSE(m_log.Has("[INFO] daemon is dead"));
+    EXPECT_TRUE(m_log.Has("[ERR] Failed to read '" + m_pid_file + "'"));
+    EXPECT_TRUE(daemon.IsRunning());
+}
+
+TEST_F(DaemonEndTest, ADaemonWhosePidFileIsLostMayStillEndByItself) {
+    ChildDaemon daemon(m_pid_file, ChildDaemon::ENDS_AT_SIGTERM, m_dir / "socket");
+    fs::remove(m_pid_file);
+    EXPECT_EQ(0, End());
+    EXPECT_TRUE(m_log.Has("[INFO] daemon is dead"));
+    EXPECT_EQ(0, daemon.EndSignal());
+}
+
+TEST_F(DaemonEndTest, SignalsDoNotShortenTheWait) {
+    ChildDaemon daemon(m_pid_file, ChildDaemon::IGNORES_SIGTERM);
+    const auto old_handler = signal(SIGALRM, [](int) {});
+    const itimerval every_ms = {
+        {0, 1000},
+        {0, 1000}
+    };
+    ASSERT_EQ(0, setitimer(ITIMER_REAL, &every_ms, nullptr));
+    const auto begin = std::chrono::steady_clock::now();
+    EXPECT_EQ(0, End());
+    const auto taken = std::chrono::steady_clock::now() - begin;
+    const itimerval none = {};
+    setitimer(ITIMER_REAL, &none, nullptr);
+    signal(SIGALRM, old_handler);
+    EXPECT_LE(std::chrono::milliseconds(10 * Places().kill_wait_ms), taken);
+    EXPECT_EQ(SIGKILL, daemon.EndSignal());
 }
 
 // The test itself stands for the daemon, and a child without rights for the control program.

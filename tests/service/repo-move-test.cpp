@@ -1,49 +1,13 @@
 #include "service/repo-move.h"
 
-#include "service/repository.h"
-#include "service/service-fixture.h"
+#include <sys/stat.h>
+
+#include "service/repo-move-fixture.h"
 #include "support/kill-at-call.h"
 
 namespace fs = std::filesystem;
 
 namespace {
-
-class RepoMoveTest : public ServiceTest {
-protected:
-    RepoMoveTest() {
-        Restore();
-        m_log.Clear();
-    }
-
-    // The repository on the first volume, the second one empty.
-    void Restore() {
-        FakeKeld::Reset().RunProgramsForReal();
-        for (const std::string& volume : {m_v1, m_v2}) {
-            fs::remove_all(volume);
-            fs::create_directory(volume);
-        }
-        EXPECT_EQ(0, MakeRepo(m_v1));
-        m_dir.Write("v1/@Ferrix/db/task-db.sqlite", "tasks");
-        m_dir.Write("v1/@Ferrix/db/task-db.sqlite-wal", "late tasks");
-        m_dir.Write("v1/@Ferrix/task/7/file-db.sqlite", std::string(300000, 'f'));
-        EXPECT_EQ(0, RegisterVolume(m_v1));
-    }
-    static bool IsWhole(const std::string& volume) {
-        const std::string repository = volume + "/@Ferrix/";
-        return fs::exists(repository + "task/7/file-db.sqlite") &&
-               ReadWholeFile(repository + "db/task-db.sqlite") == "tasks" &&
-               ReadWholeFile(repository + "db/task-db.sqlite-wal") == "late tasks" &&
-               ReadWholeFile(repository + "task/7/file-db.sqlite") == std::string(300000, 'f');
-    }
-    // What the next start finds.
-    void ExpectWholeWhereRegistered() const {
-        EXPECT_TRUE(GetRepoVolPath() == m_v1 || GetRepoVolPath() == m_v2) << GetRepoVolPath();
-        EXPECT_TRUE(IsWhole(GetRepoVolPath())) << GetRepoVolPath();
-    }
-    [[nodiscard]] bool HasFailure(const std::string& text) const {
-        return HasPlaced("ERR", "FAIL: " + text);
-    }
-};
 
 TEST_F(RepoMoveTest, ItIsCopiedThenTheOldOneGoes) {
     EXPECT_TRUE(MoveRepoData(m_v1, m_v2));
@@ -60,7 +24,7 @@ TEST_F(RepoMoveTest, ItIsCopiedThenTheOldOneGoes) {
         {"/bin/cp", "-rf", from,       staging},
         {"/bin/mv",         staging,      to},
         {"/bin/mv",         from,      old   },
-        {"/bin/rm",         "-rf",      old}
+        {"/bin/rm",         "-rf",      m_v1 + "/@tmp/@Ferrix.removed"}
     };
     EXPECT_EQ(wanted, m_fake.Programs());
     EXPECT_EQ(1, m_fake.CallCount("KLIBCBackgroundExec"));
@@ -81,60 +45,68 @@ TEST_F(RepoMoveTest, ARepositoryThatLiesInThePlaceIsKeptAside) {
     m_dir.Write("v2/@tmp/@Ferrix.replaced/db/task-db.sqlite", "still older");
     EXPECT_TRUE(MoveRepoData(m_v1, m_v2));
     EXPECT_TRUE(IsWhole(m_v2));
-    EXPECT_EQ("former", ReadWholeFile(m_v2 + "/@tmp/@Ferrix.replaced/db/task-db.sqlite"));
+    EXPECT_EQ("still older", ReadWholeFile(m_v2 + "/@tmp/@Ferrix.replaced/db/task-db.sqlite"));
+    EXPECT_EQ("former", ReadWholeFile(m_v2 + "/@tmp/@Ferrix.replaced.2/db/task-db.sqlite"));
     EXPECT_FALSE(fs::exists(m_v2 + "/@Ferrix/@Ferrix"));
     EXPECT_FALSE(fs::exists(m_v2 + "/@tmp/@Ferrix.replaced/@Ferrix"));
 }
 
-TEST_F(RepoMoveTest, AFailedCopyIsClearedAwayAndTheSourceStays) {
-    m_fake.SetProgramResult("/bin/cp", 1);
-    EXPECT_FALSE(MoveRepoData(m_v1, m_v2));
-    EXPECT_TRUE(HasFailure("cp -rf " + m_v1 + "/@Ferrix " + m_v2 + "/@tmp/@Ferrix"));
-    const std::vector<std::string> wanted = {"/bin/rm", "-rf", m_v2 + "/@tmp/@Ferrix"};
-    EXPECT_EQ(wanted, m_fake.Programs().back());
-    EXPECT_EQ(m_v1, GetRepoVolPath());
-    ExpectWholeWhereRegistered();
-    m_fake.FailCall("KLIBCBackgroundExec");
-    EXPECT_FALSE(MoveRepoData(m_v1, m_v2));
-    EXPECT_TRUE(HasFailure("rm -rf " + m_v2 + "/@tmp/@Ferrix"));
-}
-
-TEST_F(RepoMoveTest, AVolumeThatIsNotThereIsNotMade) {
-    EXPECT_FALSE(MoveRepoData(m_v1, m_dir / "none"));
-    EXPECT_FALSE(fs::exists(m_dir / "none"));
-    EXPECT_FALSE(MoveRepoData(m_dir / "none", m_v2));
-    EXPECT_FALSE(fs::exists(m_v2 + "/@Ferrix"));
-    EXPECT_EQ(m_v1, GetRepoVolPath());
-}
-
-TEST_F(RepoMoveTest, AFailureOfEachMoveLeavesTheOldRepositoryInUse) {
-    m_fake.FailCall("KLIBCExec", KELDERR_SYSTEM, 1, 1);
-    EXPECT_FALSE(MoveRepoData(m_v1, m_v2));
-    EXPECT_TRUE(HasFailure("mv " + m_v2 + "/@tmp/@Ferrix " + m_v2 + "/@Ferrix"));
-    EXPECT_EQ(m_v1, GetRepoVolPath());
-    ExpectWholeWhereRegistered();
-    m_fake.FailCall("KLIBCExec", KELDERR_SYSTEM, 1, 2);
-    EXPECT_FALSE(MoveRepoData(m_v1, m_v2));
-    EXPECT_TRUE(HasFailure("mv " + m_v1 + "/@Ferrix " + m_v1 + "/@tmp/@Ferrix"));
-    EXPECT_EQ(m_v1, GetRepoVolPath());
-    ExpectWholeWhereRegistered();
+TEST_F(RepoMoveTest, TheFolderThatItPassesThroughIsItsOwnersAlone) {
+    const mode_t saved = umask(0);
     EXPECT_TRUE(MoveRepoData(m_v1, m_v2));
-    EXPECT_TRUE(IsWhole(m_v2));
+    umask(saved);
+    EXPECT_EQ(fs::perms(0700), Mode(m_v1 + "/@tmp"));
+    EXPECT_EQ(fs::perms(0700), Mode(m_v2 + "/@tmp"));
 }
 
-TEST_F(RepoMoveTest, SettingsThatCannotBeWrittenLeaveTheOldRepositoryInUse) {
-    m_fake.FailCall("KLIBCFileSetKeyValue");
-    EXPECT_FALSE(MoveRepoData(m_v1, m_v2));
-    EXPECT_EQ(m_v1, GetRepoVolPath());
-    ExpectWholeWhereRegistered();
-}
-
-TEST_F(RepoMoveTest, AnOldCopyThatCannotBeRemovedIsToldAndTheMoveIsDone) {
-    m_fake.FailCall("KLIBCBackgroundExec");
+TEST_F(RepoMoveTest, AFolderOfThatNameThatWasThereStaysAsItIs) {
+    fs::permissions(m_dir.MakeDir("v2/@tmp"), fs::perms(0755));
     EXPECT_TRUE(MoveRepoData(m_v1, m_v2));
-    EXPECT_TRUE(HasFailure("rm -rf " + m_v1 + "/@tmp/@Ferrix"));
-    ExpectWholeWhereRegistered();
+    EXPECT_EQ(fs::perms(0755), Mode(m_v2 + "/@tmp"));
+}
+
+TEST_F(RepoMoveTest, TheRepositoryInUseIsNotReplacedByALeftover) {
+    ASSERT_EQ(0, MakeRepo(m_v2));
+    UseRegistered();
+    m_dir.Write("v2/@Ferrix/task/8/user.config", "mine");
+    ASSERT_EQ(0, RegisterVolume(m_v2));
+    EXPECT_TRUE(MoveRepoData(m_v1, m_v2));
+    EXPECT_EQ("mine", ReadWholeFile(m_v2 + "/@Ferrix/task/8/user.config"));
     EXPECT_EQ(m_v2, GetRepoVolPath());
+    EXPECT_FALSE(fs::exists(m_v1 + "/@Ferrix"));
+    // Only the settings say that it is a leftover, and not a repository of its own.
+    EXPECT_TRUE(fs::exists(m_v1 + "/@tmp/@Ferrix.replaced/used"));
+    EXPECT_TRUE(MoveRepoData(m_v1, m_v2)) << "nothing is left to do";
+    EXPECT_TRUE(m_fake.Programs().empty());
+}
+
+// The program in the background may begin at any moment, also in the middle of the way back.
+TEST_F(RepoMoveTest, ARemovalThatIsStillUnderWayDoesNotTouchTheWayBack) {
+    std::vector<std::string> pending;
+    m_fake.SetProgramResult("/bin/rm", 0);
+    m_fake.OnCall("KLIBCExec", [&] {
+        for (const std::string& path : pending) fs::remove_all(path);
+    });
+    ASSERT_TRUE(MoveRepoData(m_v1, m_v2));
+    ASSERT_EQ("/bin/rm", m_fake.Programs().back()[0]);
+    pending.push_back(m_fake.Programs().back()[2]);
+    EXPECT_TRUE(fs::exists(pending[0] + "/db/task-db.sqlite"));
+    EXPECT_TRUE(MoveRepoData(m_v2, m_v1));
+    EXPECT_TRUE(IsWhole(m_v1));
+    fs::remove_all(pending[0]);
+    EXPECT_TRUE(IsWhole(m_v1));
+    EXPECT_EQ(m_v1, GetRepoVolPath());
+}
+
+TEST_F(RepoMoveTest, ARemovalThatWasBrokenOffIsDoneByTheNextMove) {
+    m_fake.SetProgramResult("/bin/rm", 0);
+    ASSERT_TRUE(MoveRepoData(m_v1, m_v2));
+    const std::string left = m_v1 + "/@tmp/@Ferrix.removed";
+    EXPECT_TRUE(fs::exists(left));
+    FakeKeld::Reset().RunProgramsForReal();
+    ASSERT_TRUE(MoveRepoData(m_v2, m_v1));
+    EXPECT_FALSE(fs::exists(left));
+    EXPECT_TRUE(IsWhole(m_v1));
 }
 
 TEST_F(RepoMoveTest, KilledAnywhereItLeavesAWholeRepositoryThatIsFoundAgain) {
@@ -151,11 +123,12 @@ TEST_F(RepoMoveTest, KilledAnywhereItLeavesAWholeRepositoryThatIsFoundAgain) {
             ExpectWholeWhereRegistered();
             if (result == KillResult::DONE) break;
             ASSERT_EQ(KillResult::KILLED, result);
-            if (GetRepoVolPath() == m_v1) {
-                ASSERT_TRUE(MoveRepoData(m_v1, m_v2)) << nth;
-            }
+            UseRegistered();
+            ASSERT_TRUE(MoveRepoData(m_v1, m_v2)) << nth;
             ASSERT_EQ(m_v2, GetRepoVolPath());
             ASSERT_TRUE(IsWhole(m_v2)) << nth;
+            ASSERT_TRUE(IsUsed(m_v2)) << nth;
+            ASSERT_FALSE(fs::exists(m_v1 + "/@Ferrix")) << nth;
             ASSERT_FALSE(fs::exists(m_v2 + "/@Ferrix/@Ferrix")) << nth;
         }
     }

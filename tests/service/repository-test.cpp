@@ -2,6 +2,8 @@
 
 #include <sys/stat.h>
 
+#include <chrono>
+
 #include "service/service-fixture.h"
 
 namespace fs = std::filesystem;
@@ -63,6 +65,39 @@ TEST_F(RepositoryTest, AVolumeThatCannotBeRegisteredIsAFailure) {
     m_dir.Write("p/etc/keldpkg_conf", "in the way");
     EXPECT_EQ(-1, RegisterVolume(m_v1));
     EXPECT_TRUE(m_log.Contains("Failed to write"));
+}
+
+// Cut off by the settings, it would name another folder.
+TEST_F(RepositoryTest, APathThatTheSettingsCannotHoldIsNotRegistered) {
+    const std::string longest = "/" + std::string(62, 'v');
+    EXPECT_TRUE(CanBeRegistered(longest));
+    EXPECT_EQ(0, RegisterVolume(longest));
+    EXPECT_EQ(longest, GetRepoVolPath());
+    EXPECT_FALSE(CanBeRegistered(longest + "v"));
+    EXPECT_EQ(-1, RegisterVolume(longest + "v"));
+    EXPECT_EQ(longest, GetRepoVolPath());
+    EXPECT_EQ("[\"" + longest + "\"]\n", VolumeList());
+    EXPECT_TRUE(m_log.Has("[ERR] The path of volume '" + longest + "v' is too long"));
+}
+
+TEST_F(RepositoryTest, TheListIsAsciiWhateverTheVolumeIsCalled) {
+    EXPECT_EQ(0, RegisterVolume("/v\xc3\xb6l \\1"));
+    EXPECT_EQ("[\"/v\\u00f6l \\\\1\"]\n", VolumeList());
+}
+
+TEST_F(RepositoryTest, AListThatNamesAnotherVolumeIsWrittenAnew) {
+    ASSERT_EQ(0, RegisterVolume(m_v1));
+    UpdateVolumeList(m_v2);
+    EXPECT_EQ("[\"" + m_v2 + "\"]\n", VolumeList());
+    EXPECT_EQ(m_v1, GetRepoVolPath());
+    const std::string path = m_dir / "p/etc/keldpkg_conf/reg_volume";
+    fs::remove(path);
+    UpdateVolumeList(m_v2);
+    EXPECT_EQ("[\"" + m_v2 + "\"]\n", VolumeList());
+    const auto written = fs::last_write_time(path) - std::chrono::hours(1);
+    fs::last_write_time(path, written);
+    UpdateVolumeList(m_v2);
+    EXPECT_EQ(written, fs::last_write_time(path)) << "it was right";
 }
 
 }  // namespace

@@ -6,12 +6,14 @@
 #include <gtest/gtest.h>
 
 #include <filesystem>
+#include <memory>
 #include <string>
 
 #include "fake/fake-keld.h"
 #include "platform/global-setting.h"
 #include "platform/package-paths.h"
 #include "platform/service-status.h"
+#include "service/child-daemon.h"
 #include "service/service-ctrl.h"
 #include "support/log-capture.h"
 #include "support/temp-dir.h"
@@ -24,6 +26,7 @@ protected:
         SetPackageFolderForTest(m_dir / "p");
         m_fake.AddVolume({.mount_path = m_v1});
         m_fake.AddVolume({.mount_path = m_v2});
+        LetDaemonStart();
     }
     ~ServiceTest() override { SetPackageFolderForTest(""); }
 
@@ -34,6 +37,18 @@ protected:
         };
     }
     [[nodiscard]] ServiceCtrl Ctrl() const { return ServiceCtrl(Places()); }
+
+    // What the daemon's program does when it is run: by default it leaves a daemon behind.
+    void OnDaemonProgram(const std::function<void()>& action) {
+        m_fake.OnCall("KLIBCExec", [this, action] {
+            if (m_fake.CallsOf("KLIBCExec").back()[0] == m_program) action();
+        });
+    }
+    void LetDaemonStart() {
+        OnDaemonProgram([this] {
+            m_started = std::make_unique<ChildDaemon>(m_pid_file, ChildDaemon::ENDS_AT_SIGTERM);
+        });
+    }
 
     // The file of the state, as other programs read it.
     [[nodiscard]] std::string Status() const { return ReadWholeFile(m_dir / "p/etc/status"); }
@@ -66,4 +81,5 @@ protected:
     std::string m_pid_file = m_dir / "daemon.pid";
     std::string m_program = m_dir / "p/target/sbin/ferrixd";
     LogCapture m_log;
+    std::unique_ptr<ChildDaemon> m_started;
 };

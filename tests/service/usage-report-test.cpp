@@ -2,11 +2,16 @@
 
 #include <json/value.h>
 
+#include <atomic>
+#include <memory>
+#include <thread>
+
 #include "db/raw-database.h"
 #include "db/task-db.h"
 #include "platform/json-util.h"
 #include "service/repository.h"
 #include "service/service-fixture.h"
+#include "service/service-lock.h"
 
 namespace fs = std::filesystem;
 
@@ -91,6 +96,26 @@ TEST_F(UsageReportTest, NoDatabaseIsMadeForAReport) {
     EXPECT_EQ("", Print(-1));
     EXPECT_TRUE(m_log.Has("[ERR] Failed to init task db at '" + m_db_path + "'"));
     EXPECT_FALSE(fs::exists(m_db_path));
+}
+
+// An upgrade puts another database in place of the one that would be read.
+TEST_F(UsageReportTest, AReportWaitsForTheOperationOfAnotherProgram) {
+    {
+        TaskDB db;
+        ASSERT_EQ(0, db.Init(m_db_path));
+    }
+    auto operation = std::make_unique<ServiceLock>();
+    std::atomic<bool> is_printed = false;
+    testing::internal::CaptureStdout();
+    std::thread report([&] {
+        EXPECT_EQ(0, PrintUsageReport());
+        is_printed = true;
+    });
+    LetOtherThreadMeetTheLock();
+    EXPECT_FALSE(is_printed);
+    operation.reset();
+    report.join();
+    EXPECT_NE("", testing::internal::GetCapturedStdout());
 }
 
 TEST_F(UsageReportTest, RowsThatCannotBeReadAreAFailure) {

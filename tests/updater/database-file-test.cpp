@@ -2,6 +2,11 @@
 
 #include <sys/stat.h>
 
+#include <cerrno>
+#include <memory>
+#include <thread>
+
+#include "updater/rename-faults.h"
 #include "updater/updater-fixture.h"
 
 namespace fs = std::filesystem;
@@ -61,15 +66,17 @@ TEST_F(DatabaseFileTest, AFileThatIsNoDatabaseIsRefused) {
     EXPECT_FALSE(fs::exists(m_dir / "none"));
 }
 
-TEST_F(DatabaseFileTest, AllOfADatabaseIsRemoved) {
-    for (const char* part : {"", "-wal", "-shm", "-journal"})
-        m_dir.Write("task.db" + std::string(part), "x");
-    const std::string other = m_dir.Write("task.db-other", "x");
-    RemoveDatabase(m_path);
-    for (const char* part : {"", "-wal", "-shm", "-journal"})
-        EXPECT_FALSE(fs::exists(m_path + part));
-    EXPECT_TRUE(fs::exists(other));
-    RemoveDatabase(m_path);
+// sqlite itself does not wait when a database leaves the WAL mode.
+TEST_F(DatabaseFileTest, AProgramThatHasItOpenForAMomentIsWaitedFor) {
+    auto other = std::make_unique<RawDatabase>(m_path);
+    other->Run("PRAGMA journal_mode = WAL; CREATE TABLE t (a); INSERT INTO t VALUES (1);");
+    std::thread program([&] {
+        LetOtherThreadMeetTheLock();
+        other.reset();
+    });
+    EXPECT_EQ(0, MakeSingleFile(m_path));
+    program.join();
+    EXPECT_EQ("1", Rows(m_path));
 }
 
 TEST_F(DatabaseFileTest, NothingIsPutBesideAJournal) {
@@ -80,16 +87,55 @@ TEST_F(DatabaseFileTest, NothingIsPutBesideAJournal) {
         for (const char* part : {"-wal", "-shm", "-journal"}) {
             const TempDir keeper;
             fs::copy_file(from, path + part);
-            EXPECT_EQ(-1, PutInPlace(from, m_path, is_moved)) << path << part;
+            EXPECT_EQ(-1, PutInPlace(from, m_path, Place::TAKEN, is_moved)) << path << part;
             EXPECT_FALSE(is_moved);
             fs::remove(path + part);
         }
     }
     EXPECT_EQ("old", ReadWholeFile(m_path));
-    EXPECT_EQ(0, PutInPlace(from, m_path, is_moved));
+    EXPECT_EQ(0, PutInPlace(from, m_path, Place::TAKEN, is_moved));
     EXPECT_TRUE(is_moved);
     EXPECT_EQ("new", ReadWholeFile(m_path));
     EXPECT_FALSE(fs::exists(from));
+}
+
+TEST_F(DatabaseFileTest, NothingIsReplacedInAPlaceThatWasToBeFree) {
+    const std::string from = m_dir.Write("new.db", "new");
+    m_dir.Write("task.db", "old");
+    bool is_moved = true;
+    EXPECT_EQ(-1, PutInPlace(from, m_path, Place::FREE, is_moved));
+    EXPECT_FALSE(is_moved);
+    EXPECT_EQ("old", ReadWholeFile(m_path));
+    fs::remove(m_path);
+    EXPECT_EQ(0, PutInPlace(from, m_path, Place::FREE, is_moved));
+    EXPECT_TRUE(is_moved);
+    EXPECT_EQ("new", ReadWholeFile(m_path));
+}
+
+TEST_F(DatabaseFileTest, ASystemThatCannotKeepWhatIsThereIsAskedFirst) {
+    for (const int error : {ENOSYS, EINVAL}) {
+        const FailRename no_flags("task.db", error, FailRename::WITH_FLAGS);
+        const std::string from = m_dir.Write("new.db", "new");
+        m_dir.Write("task.db", "old");
+        bool is_moved = true;
+        EXPECT_EQ(-1, PutInPlace(from, m_path, Place::FREE, is_moved)) << error;
+        EXPECT_EQ("old", ReadWholeFile(m_path));
+        fs::remove(m_path);
+        EXPECT_EQ(0, PutInPlace(from, m_path, Place::FREE, is_moved)) << error;
+        EXPECT_TRUE(is_moved);
+        EXPECT_EQ("new", ReadWholeFile(m_path));
+    }
+}
+
+TEST_F(DatabaseFileTest, APlaceThatMayNotLastIsTold) {
+    for (const Place place : {Place::FREE, Place::TAKEN}) {
+        const FailFlushAfterRename power_cut("task.db");
+        fs::remove(m_path);
+        bool is_moved = false;
+        EXPECT_EQ(-1, PutInPlace(m_dir.Write("new.db", "new"), m_path, place, is_moved));
+        EXPECT_TRUE(is_moved);
+        EXPECT_EQ("new", ReadWholeFile(m_path));
+    }
 }
 
 TEST_F(DatabaseFileTest, ACopyHoldsWhatTheLogHeldAndGoesAtTheEnd) {

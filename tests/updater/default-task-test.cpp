@@ -157,6 +157,48 @@ TEST_F(NewInstallTest, SettingsThatCannotBeReadStopIt) {
     EXPECT_TRUE(m_log.Has("[ERR] Failed to prepare default task at '" + m_repository + "'"));
 }
 
+TEST_F(NewInstallTest, CapabilitiesThatCannotBeReadAreNotAModelWithoutFrontPorts) {
+    SetCapabilities(BOTH);
+    SetSettings("ferrixfolder=\"photos/in\"\n");
+    for (const int skip : {0, 1}) {
+        m_fake.FailCall("KLIBCFileCheckKeyValue", KELDERR_SYSTEM, 1, skip);
+        EXPECT_EQ(-1, Run());
+        EXPECT_FALSE(fs::exists(m_task_db));
+        EXPECT_EQ(std::vector<std::string>{}, Leftovers());
+        EXPECT_EQ("ferrixfolder=\"photos/in\"\n", Settings());
+    }
+    EXPECT_EQ(1, m_log.Count("[ERR] Failed to prepare Ferrix default task"));
+    EXPECT_EQ(1, m_log.Count("[ERR] Failed to prepare SDFerrix default task"));
+    EXPECT_FALSE(m_log.Contains("Not support"));
+    EXPECT_EQ(0, Run());
+    EXPECT_EQ("photos", Task("FERRIX_DEFAULT_USB_UUID").hub_share_name);
+    EXPECT_EQ("", Task("FERRIX_DEFAULT_SD_UUID").hub_share_name);
+}
+
+// Numbers start again where a repository has lost its task database and not its folders.
+TEST_F(NewInstallTest, WhatATaskOfTheSameNumberHadCopiedIsForgotten) {
+    SetCapabilities("ferrix=\"yes\"\n");
+    for (const char* part : {"", "-wal", "-shm", "-journal"}) {
+        m_dir.Write("v1/@Ferrix/task/1/file-db.sqlite" + std::string(part), "left");
+    }
+    m_dir.Write("v1/@Ferrix/task/1/version-marks", "left");
+    m_dir.Write("v1/@Ferrix/task/2/file-db.sqlite", "of no task yet");
+    ASSERT_EQ(0, Run());
+    EXPECT_EQ((std::vector<std::string>{"blacklist.filter", "user.config", "version-marks",
+                                        "whitelist.filter"}),
+              FilesIn(InRepository("task/1")));
+    EXPECT_EQ("left", ReadWholeFile(InRepository("task/1/version-marks")));
+    EXPECT_TRUE(fs::exists(InRepository("task/2/file-db.sqlite")));
+}
+
+TEST_F(NewInstallTest, WhatCannotBeForgottenIsNotTakenOver) {
+    SetCapabilities("ferrix=\"yes\"\n");
+    m_dir.MakeDir("v1/@Ferrix/task/1/file-db.sqlite");
+    EXPECT_EQ(-1, Run());
+    EXPECT_TRUE(m_log.Has("[ERR] Failed to prepare task config '1'"));
+    EXPECT_FALSE(fs::exists(m_task_db));
+}
+
 TEST_F(NewInstallTest, AFailureLeavesNoDatabaseAndTheNextRunDoesAll) {
     SetCapabilities(BOTH);
     SetSettings("ferrixfolder=\"photos/in\"\nsdferrixfolder=\"cards\"\n");
@@ -170,16 +212,6 @@ TEST_F(NewInstallTest, AFailureLeavesNoDatabaseAndTheNextRunDoesAll) {
     EXPECT_EQ("photos", Task("FERRIX_DEFAULT_USB_UUID").hub_share_name);
     EXPECT_EQ("cards", Task("FERRIX_DEFAULT_SD_UUID").hub_share_name);
     EXPECT_EQ("", Settings());
-}
-
-TEST_F(NewInstallTest, AKeyThatCannotBeRemovedIsToldAndTheTaskStays) {
-    SetCapabilities("ferrix=\"yes\"\n");
-    SetSettings("ferrixfolder=\"photos\"\n");
-    m_fake.FailCall("KLIBCFileRemoveKey");
-    EXPECT_EQ(-1, Run());
-    EXPECT_TRUE(m_log.Has("[ERR] Failed to remove key'ferrixfolder'"));
-    EXPECT_EQ(0, Run());
-    EXPECT_EQ("photos", Task("FERRIX_DEFAULT_USB_UUID").hub_share_name);
 }
 
 TEST_F(NewInstallTest, ADatabaseThatCannotBeMadeIsTold) {

@@ -6,6 +6,8 @@ namespace fs = std::filesystem;
 
 namespace {
 
+constexpr char SETTINGS[] = "ferrixfolder=\"photos/in\"\nkeep=\"1\"\n";
+
 class UpdaterKillTest : public UpdaterTest {
 protected:
     // A fresh repository: a copy of the prepared one.
@@ -13,7 +15,7 @@ protected:
         fs::remove_all(m_dir / "v1");
         fs::copy(m_dir / "master", m_dir / "v1", fs::copy_options::recursive);
         FakeKeld::Reset();
-        SetSettings("ferrixfolder=\"photos/in\"\nkeep=\"1\"\n");
+        SetSettings(SETTINGS);
     }
     void Keep() {
         fs::remove_all(m_dir / "master");
@@ -62,6 +64,7 @@ TEST_F(UpdaterKillTest, AnOldRepositoryIsOldOrNewWhereverItStops) {
                             << testing::PrintToString(m_log.Lines());
         ASSERT_EQ(new_dumps, Dumps()) << "after call " << killed;
         ASSERT_EQ(files, FilesIn(m_repository)) << "after call " << killed;
+        ASSERT_EQ(SETTINGS, Settings()) << "after call " << killed;
     }
     EXPECT_GT(killed, 100);
     EXPECT_EQ(new_dumps, Dumps());
@@ -85,11 +88,12 @@ TEST_F(UpdaterKillTest, ANewRepositoryHasItsDefaultTasksOrNoDatabaseWhereverItSt
         if (fs::exists(m_task_db)) {
             ASSERT_EQ(wanted, Dumps()) << "after call " << killed;
         } else {
-            ASSERT_EQ("ferrixfolder=\"photos/in\"\nkeep=\"1\"\n", Settings());
+            ASSERT_EQ(SETTINGS, Settings());
         }
         ASSERT_EQ(0, Run()) << "after call " << killed;
         ASSERT_EQ(wanted, Dumps()) << "after call " << killed;
         ASSERT_EQ(files, FilesIn(m_repository)) << "after call " << killed;
+        ASSERT_EQ("keep=\"1\"\n", Settings()) << "after call " << killed;
     }
     EXPECT_GT(killed, 50);
     EXPECT_EQ("keep=\"1\"\n", Settings());
