@@ -7,6 +7,7 @@
 #include "processor/barrier.h"
 #include "processor/hardware-controller.h"
 #include "processor/task-event-manager.h"
+#include "strategy/version-name.h"
 #include "utils/error-code.h"
 #include "worker-fixture.h"
 
@@ -198,6 +199,21 @@ TEST_F(TaskProcessorTest, AVersionTaskGetsADatedFolderThatIsIndexed) {
     const std::string dir = *m_version_dirs.begin();
     EXPECT_THAT(dir, testing::MatchesRegex("Ferrix Copy_[0-9]{4}-[0-9]{2}-[0-9]{2}_[0-9]{6}"));
     EXPECT_THAT(m_fake.Indexed(), ElementsAre(m_share + "/version/" + dir));
+}
+
+TEST_F(TaskProcessorTest, ARunDoesNotGoIntoAVersionThatIsThere) {
+    m_task = AddTask("version", TASK_TYPE_IMPORT_GENERAL, COPY_STRATEGY_VERSION);
+    const time_t now = time(nullptr);
+    std::string name;
+    for (int second = 0; second <= 60; ++second) {
+        ASSERT_EQ(0, NameVersion(now + second, name));
+        m_dir.MakeDir("volume1/photos/version/" + name);
+    }
+    Push();
+    m_worker.RunOnce();
+    ASSERT_EQ(0, NameVersion(now + 61, name));
+    EXPECT_THAT(m_version_dirs, ElementsAre(name));
+    EXPECT_THAT(m_fake.Indexed(), ElementsAre(m_share + "/version/" + name));
 }
 
 TEST_F(TaskProcessorTest, AnExportIsNotIndexed) {

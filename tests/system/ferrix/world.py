@@ -65,6 +65,9 @@ def _make_devices(dev):
         _node(f"{dev}/loop{number}", stat.S_IFBLK, 7, number)
     os.symlink("/proc/self/fd", f"{dev}/fd")
     os.mkdir(f"{dev}/shm", 0o1777)
+    os.mkdir(f"{dev}/pts")  # terminals
+    mount("devpts", f"{dev}/pts", "devpts", 0, "newinstance,ptmxmode=0666,mode=620")
+    os.symlink("pts/ptmx", f"{dev}/ptmx")
 
 
 def _node(path, kind, major, minor):

@@ -310,6 +310,33 @@ def test_a_changed_naming_gives_changed_files_new_names(box):
                         "/2023-05-06/2023-05-06_070810.jpg": b"b2"})
 
 
+def test_names_that_differ_in_case_alone_all_live(box):
+    """Moved to exFAT, which ignores case, files and folders of two spellings all arrive, whatever the
+    policy is."""
+    wanted = {"img.jpg": b"one", "IMG.JPG": b"two", "Img.jpg": b"three", "dcim/a": b"four",
+              "DCIM/A": b"five", "DCIM/b": b"six", "note": b"a file", "NOTE/c": b"below a folder"}
+    share = box.add_share("photos")
+    stick = box.add_device("stick", "exfat", 64)
+    stick.mount()
+    box.start()
+    tasks = {}
+    for policy in (OVERWRITE, RENAME):
+        for position, (name, content) in enumerate(wanted.items()):
+            write(f"{share}/out{policy}/{name}", content, MAY_6 + 2 * position)
+        os.mkdir(stick.path(f"backup{policy}"))
+        tasks[policy] = box.add_mirror(
+            stick, folder=f"/out{policy}", usb_folder=f"/backup{policy}", export=True,
+            name=f"Move {policy}", run_when_plug_in=False, copy_strategy=3, conflict_policy=policy,
+            remove_src_file=True)
+    stick.hook("post_mount")
+    for number, (policy, task) in enumerate(tasks.items(), 1):
+        box.ask("run_task", task_id=task)
+        assert box.wait_run(task, number) == "successful"
+        same(files(f"{share}/out{policy}"), {})
+        found = files(stick.path(f"backup{policy}"))
+        assert sorted(found.values()) == sorted(wanted.values()), found
+
+
 def test_a_random_tree_of_hostile_names(box):
     """A tree of hostile names arrives whole, and its changes follow without a removal."""
     share, card, task = prepare(box)

@@ -112,8 +112,7 @@ def test_every_file_system_of_a_device(box):
             tree.write(stick.path(f"img{number}.jpg"), rng)
         task = box.add_mirror(stick, share=fs, name=fs)
         stick.hook("post_mount")
-        wait_until(lambda: box.task(task)["latest_finish_time"] > 0, 60)
-        assert box.status(task) == "successful"
+        box.wait_status(task, "successful")
         equal(stick, share)
         stick.unplug()
         assert box.status(task) == "unmounted"

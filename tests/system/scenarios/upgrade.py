@@ -185,6 +185,7 @@ def test_the_service_is_made_started_stopped_and_moved(box):
     assert [t["task_name"] for t in box.ask("list_task")["task_list"]] == ["Default Ferrix"]
     assert service(box, "start")[0] == 0
     assert box.daemon_pid == first
+    assert service(box, "status")[1] == "4", "a start of what runs changes no state"
     stick = box.add_device("stick")
     stick.mount()
     task = box.add_mirror(stick)

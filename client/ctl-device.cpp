@@ -1,0 +1,74 @@
+#include <json/value.h>
+
+#include <iostream>
+
+#include "client/command.h"
+#include "client/ctl.h"
+#include "client/exit-status.h"
+#include "client/json-output.h"
+#include "client/plugged-device.h"
+#include "client/table.h"
+#include "client/task-text.h"
+#include "client/text.h"
+
+namespace {
+
+// The daemon may not run: what is plugged in can be told all the same.
+PObject::array_type TasksIfReachable(const Ctl& ctl, bool& is_reachable) {
+    try {
+        is_reachable = true;
+        return ctl.daemon.Tasks();
+    } catch (const CommandError& error) {
+        if (error.Status() != EXIT_NOT_REACHABLE) throw;
+        is_reachable = false;
+        return {};
+    }
+}
+
+const PObject* TaskOf(const PluggedDevice& device, const PObject::array_type& tasks) {
+    for (const PObject& task : tasks) {
+        if (!device.uuid.empty() && task["uuid"].StringView() == device.uuid) return &task;
+    }
+    return nullptr;
+}
+
+void ListDevices(const Ctl& ctl, bool as_json) {
+    bool is_reachable = false;
+    const PObject::array_type tasks = TasksIfReachable(ctl, is_reachable);
+    const std::vector<PluggedDevice> devices = ListPluggedDevices();
+    Json::Value list(Json::arrayValue);
+    Table table({"MOUNTED ON", "DEVICE", "UUID", "TASK", "STATUS"});
+    for (const PluggedDevice& device : devices) {
+        const PObject* task = TaskOf(device, tasks);
+        Json::Value entry;
+        entry["mountpoint"] = JsonText(device.mount_path);
+        entry["device"] = JsonText(device.device_path);
+        entry["uuid"] = JsonText(device.uuid);
+        entry["task_id"] = task == nullptr ? Json::Value() : Json::Value(static_cast<Json::UInt64>((*task)["id"].AsUInt64()));
+        list.append(entry);
+        table.Add({Printable(device.mount_path), Printable(device.device_path),
+                   device.uuid.empty() ? "none" : Printable(device.uuid),
+                   task == nullptr ? (is_reachable ? "none" : "?") : TaskLabel(*task),
+                   task == nullptr ? Table::Cell("-") : StatusCell(*task)});
+    }
+    if (as_json) return PrintJson(list);
+    if (devices.empty()) {
+        std::cout << "No device is plugged in.\n";
+        return;
+    }
+    std::cout << table.Text(ctl.output);
+    if (!is_reachable) std::cout << "The daemon does not run: tasks are not known.\n";
+}
+
+}  // namespace
+
+void AddDeviceCommands(CLI::App& program, const Ctl& ctl) {
+    CLI::App* group = AddCommandGroup(program, "device", "The devices that are plugged in.",
+                                      "ferrixctl device list");
+    const auto as_json = std::make_shared<bool>(false);
+    CLI::App* list = AddCommand(*group, "list",
+                                "Lists what is plugged in, with its uuid and its task.",
+                                "ferrixctl device list");
+    AddJsonOption(*list, *as_json);
+    list->callback([as_json, &ctl] { ListDevices(ctl, *as_json); });
+}

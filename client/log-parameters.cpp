@@ -1,0 +1,33 @@
+#include "client/log-parameters.h"
+
+#include <json/reader.h>
+#include <json/value.h>
+
+#include <exception>
+#include <memory>
+
+namespace {
+
+bool ReadJson(const std::string& text, Json::Value& value) {
+    Json::CharReaderBuilder builder;
+    Json::CharReaderBuilder::strictMode(&builder.settings_);
+    const std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
+    try {
+        return reader->parse(text.data(), text.data() + text.size(), &value, nullptr);
+    } catch (const std::exception&) {  // nested too deeply
+        return false;
+    }
+}
+
+}  // namespace
+
+std::optional<std::vector<std::string>> LogParameters(const std::string& stored) {
+    Json::Value array;
+    if (!ReadJson(stored, array) || !array.isArray()) return std::nullopt;
+    std::vector<std::string> texts;
+    for (const Json::Value& text : array) {
+        if (!text.isString()) return std::nullopt;
+        texts.push_back(text.asString());
+    }
+    return texts;
+}
