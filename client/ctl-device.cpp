@@ -1,10 +1,10 @@
 #include <json/value.h>
 
 #include <iostream>
+#include <optional>
 
 #include "client/command.h"
 #include "client/ctl.h"
-#include "client/exit-status.h"
 #include "client/json-output.h"
 #include "client/plugged-device.h"
 #include "client/table.h"
@@ -12,18 +12,6 @@
 #include "client/text.h"
 
 namespace {
-
-// The daemon may not run: what is plugged in can be told all the same.
-PObject::array_type TasksIfReachable(const Ctl& ctl, bool& is_reachable) {
-    try {
-        is_reachable = true;
-        return ctl.daemon.Tasks();
-    } catch (const CommandError& error) {
-        if (error.Status() != EXIT_NOT_REACHABLE) throw;
-        is_reachable = false;
-        return {};
-    }
-}
 
 const PObject* TaskOf(const PluggedDevice& device, const PObject::array_type& tasks) {
     for (const PObject& task : tasks) {
@@ -33,8 +21,10 @@ const PObject* TaskOf(const PluggedDevice& device, const PObject::array_type& ta
 }
 
 void ListDevices(const Ctl& ctl, bool as_json) {
-    bool is_reachable = false;
-    const PObject::array_type tasks = TasksIfReachable(ctl, is_reachable);
+    // What is plugged in can be told without the daemon.
+    const std::optional<PObject::array_type> known = ctl.daemon.TasksIfReachable();
+    const bool is_reachable = known.has_value();
+    const PObject::array_type tasks = known.value_or(PObject::array_type());
     const std::vector<PluggedDevice> devices = ListPluggedDevices();
     Json::Value list(Json::arrayValue);
     Table table({"MOUNTED ON", "DEVICE", "UUID", "TASK", "STATUS"});

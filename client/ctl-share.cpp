@@ -19,16 +19,6 @@ namespace {
 
 using TaskList = std::optional<PObject::array_type>;  // none: the daemon does not answer
 
-// Shares can be told without the daemon.
-TaskList TasksIfReachable(const Ctl& ctl) {
-    try {
-        return ctl.daemon.Tasks();
-    } catch (const CommandError& error) {
-        if (error.Status() != EXIT_NOT_REACHABLE) throw;
-        return std::nullopt;
-    }
-}
-
 Table::Cell StateCell(const SDK::Share& share) {
     if (!share.IsMounted()) return {"locked", Colour::YELLOW};
     if (!FSExists(share.GetPath())) return {"missing", Colour::RED};
@@ -70,7 +60,7 @@ void ListShares(const Ctl& ctl, bool as_json) {
     if (SDK::ListShares(1, names) < 0) {
         throw CommandError(EXIT_REFUSED, "the shares cannot be listed");
     }
-    const TaskList tasks = TasksIfReachable(ctl);
+    const TaskList tasks = ctl.daemon.TasksIfReachable();
     Json::Value list(Json::arrayValue);
     Table table({"NAME", "FOLDER", "VOLUME", "STATE", "RECYCLE BIN", "TASKS"});
     for (const std::string& name : names) {

@@ -45,6 +45,15 @@ PObject::array_type DaemonClient::Tasks() const {
     return response["task_list"].AsArray();
 }
 
+std::optional<PObject::array_type> DaemonClient::TasksIfReachable() const {
+    try {
+        return Tasks();
+    } catch (const CommandError& error) {
+        if (error.Status() != EXIT_NOT_REACHABLE) throw;
+        return std::nullopt;
+    }
+}
+
 PObject DaemonClient::FindTask(const std::string& id_or_name) const {
     const PObject::array_type tasks = Tasks();
     for (const PObject& task : tasks) {

@@ -5,6 +5,7 @@
 #pragma once
 
 #include <cstdint>
+#include <optional>
 #include <string>
 #include <utility>
 #include <vector>
@@ -28,6 +29,8 @@ public:
 
     // The descriptions of all tasks.
     [[nodiscard]] PObject::array_type Tasks() const;
+    // The same; nothing when no daemon answers.
+    [[nodiscard]] std::optional<PObject::array_type> TasksIfReachable() const;
     // The description of the task with this id or, failing that, this name. EXIT_USAGE when there is
     // none or the name is that of several.
     [[nodiscard]] PObject FindTask(const std::string& id_or_name) const;

@@ -50,6 +50,7 @@ void ReadValue(CLI::Option& option, OptionInfo& info) {
 
 std::vector<std::string> Labels(const std::set<CLI::Option*>& options) {
     std::vector<std::string> labels;
+    labels.reserve(options.size());
     for (const CLI::Option* option : options) labels.push_back(option->get_name());
     std::sort(labels.begin(), labels.end());  // a set of pointers has no order of its own
     return labels;

@@ -53,7 +53,6 @@ void WriteHead(std::string& page, const ManPage& data, const std::string& summar
 void WriteSections(std::string& page, const ManPage& data) {
     for (const ManPage::Section& section : data.sections) {
         page += ".SH " + RoffText(section.title) + "\n";
-        for (const std::string& text : section.paragraphs) WriteParagraph(page, text);
         for (const ManPage::Entry& entry : section.entries) {
             WriteEntry(page, RoffBold(entry.term), RoffText(entry.text));
         }

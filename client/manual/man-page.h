@@ -14,7 +14,6 @@ struct ManPage {
     };
     struct Section {
         std::string title;  // "EXIT STATUS"
-        std::vector<std::string> paragraphs;
         std::vector<Entry> entries;
     };
 

@@ -35,6 +35,15 @@ std::string Map(const std::vector<std::pair<std::string, std::string>>& pairs) {
     return bytes + "\x40";
 }
 
+// The request for a task whose id has these bytes on the wire.
+std::string RunTask(const std::string& id) {
+    const std::string integer = std::string{'\x01', static_cast<char>(id.size())} + id;
+    return Map({
+        {"action",  String("run_task")},
+        {"task_id", integer           }
+    });
+}
+
 // Takes as many bytes as the request shall have, answers, and takes what comes after.
 class RawDaemon {
 public:
@@ -96,10 +105,7 @@ protected:
 }  // namespace
 
 TEST_F(NotifierTest, ATaskIsRunByItsId) {
-    const std::string request = Map({
-        {"action",                    String("run_task")},
-        { "task_id", std::string("\x01\x01\x07",                 3)}
-    });
+    const std::string request = RunTask("\x07");
     RawDaemon daemon(m_path, request.size(), ACK);
     EXPECT_EQ(EXIT_DONE, Run({"--execute-task", "7"}));
     EXPECT_EQ(request, daemon.Request());
@@ -108,20 +114,14 @@ TEST_F(NotifierTest, ATaskIsRunByItsId) {
 }
 
 TEST_F(NotifierTest, AnIdHasAll64Bits) {
-    const std::string request = Map({
-        {"action",  String("run_task")                        },
-        {"task_id", "\x01\x08\xff\xff\xff\xff\xff\xff\xff\xff"}
-    });
+    const std::string request = RunTask("\xff\xff\xff\xff\xff\xff\xff\xff");
     RawDaemon daemon(m_path, request.size(), ACK);
     EXPECT_EQ(EXIT_DONE, Run({"--execute-task=18446744073709551615"}));
     EXPECT_EQ(request, daemon.Request());
 }
 
 TEST_F(NotifierTest, AnIdIsDecimalAlsoWithAZeroInFront) {
-    const std::string request = Map({
-        {"action",                    String("run_task")},
-        { "task_id", std::string("\x01\x01\x0a",                 3)}
-    });
+    const std::string request = RunTask("\x0a");
     RawDaemon daemon(m_path, request.size(), ACK);
     EXPECT_EQ(EXIT_DONE, Run({"--execute-task", "010"}));
     EXPECT_EQ(request, daemon.Request());
@@ -153,16 +153,14 @@ TEST_F(NotifierTest, AHookNeedsNoKeys) {
 }
 
 TEST_F(NotifierTest, ARefusalIsToldInTheDaemonsWords) {
-    const std::string request = Map({
-        {"action",                    String("run_task")},
-        { "task_id", std::string("\x01\x01\x07",                 3)}
+    const std::string request = RunTask("\x07");
+    const std::string error_code("\x01\x01\x0b", 3);
+    const std::string refusal = Map({
+        {"ack",        String("ok")                  },
+        {"error",      String("Task is not runnable")},
+        {"error_code", error_code                    }
     });
-    RawDaemon daemon(m_path, request.size(),
-                     Map({
-                         {"ack",                           String("ok")},
-                         {            "error", String("Task is not runnable")            },
-                         { "error_code",                             std::string("\x01\x01\x0b",                                         3)}
-    }));
+    RawDaemon daemon(m_path, request.size(), refusal);
     EXPECT_EQ(EXIT_REFUSED, Run({"--execute-task", "7"}));
     EXPECT_EQ("", m_output);
     EXPECT_THAT(m_errors, HasSubstr("ferrix-notifier: Task is not runnable"));

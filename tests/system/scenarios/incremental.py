@@ -316,24 +316,19 @@ def test_names_that_differ_in_case_alone_all_live(box):
     wanted = {"img.jpg": b"one", "IMG.JPG": b"two", "Img.jpg": b"three", "dcim/a": b"four",
               "DCIM/A": b"five", "DCIM/b": b"six", "note": b"a file", "NOTE/c": b"below a folder"}
     share = box.add_share("photos")
-    stick = box.add_device("stick", "exfat", 64)
-    stick.mount()
     box.start()
-    tasks = {}
-    for policy in (OVERWRITE, RENAME):
+    for number, policy in enumerate((OVERWRITE, RENAME), 1):
         for position, (name, content) in enumerate(wanted.items()):
-            write(f"{share}/out{policy}/{name}", content, MAY_6 + 2 * position)
-        os.mkdir(stick.path(f"backup{policy}"))
-        tasks[policy] = box.add_mirror(
-            stick, folder=f"/out{policy}", usb_folder=f"/backup{policy}", export=True,
-            name=f"Move {policy}", run_when_plug_in=False, copy_strategy=3, conflict_policy=policy,
-            remove_src_file=True)
-    stick.hook("post_mount")
-    for number, (policy, task) in enumerate(tasks.items(), 1):
-        box.ask("run_task", task_id=task)
-        assert box.wait_run(task, number) == "successful"
-        same(files(f"{share}/out{policy}"), {})
-        found = files(stick.path(f"backup{policy}"))
+            write(f"{share}/out{number}/{name}", content, MAY_6 + 2 * position)
+        stick = box.add_device(f"stick{number}", "exfat", 64)
+        stick.mount()
+        box.add_mirror(stick, folder=f"/out{number}", export=True, name=f"Move {number}",
+                       copy_strategy=3, conflict_policy=policy, remove_src_file=True)
+        stick.hook("post_mount")
+        wait_until(lambda n=number: len(box.log_rows("description_id IN (101, 102, 103)")) >= n, 120)
+        assert len(box.log_rows("description_id = 101")) == number, box.log_rows()
+        same(files(f"{share}/out{number}"), {})
+        found = files(stick.mountpoint)
         assert sorted(found.values()) == sorted(wanted.values()), found
 
 
