@@ -4,6 +4,7 @@
 
 #include "client/exit-status.h"
 #include "client/help-formatter.h"
+#include "client/text.h"
 
 namespace {
 
@@ -38,8 +39,8 @@ CLI::App* AddCommand(CLI::App& parent, const std::string& name, const std::strin
     return command;
 }
 
-CLI::App* AddCommandGroup(CLI::App& parent, const std::string& name,
-                          const std::string& description, const std::string& example) {
+CLI::App* AddCommandGroup(CLI::App& parent, const std::string& name, const std::string& description,
+                          const std::string& example) {
     CLI::App* group = AddCommand(parent, name, description, example);
     group->require_subcommand(1);
     return group;
@@ -58,7 +59,7 @@ int RunProgram(CLI::App& program, int argc, const char* const* argv) {
     } catch (const CLI::Success& help) {
         return program.exit(help);
     } catch (const CLI::ParseError& error) {
-        std::cerr << program.get_name() << ": " << error.what() << "\n\""
+        std::cerr << program.get_name() << ": " << Printable(error.what()) << "\n\""
                   << CommandWords(program) << " --help\" tells more\n";
         return EXIT_USAGE;
     } catch (const CommandError& error) {

@@ -10,8 +10,8 @@
 CLI::App* AddCommand(CLI::App& parent, const std::string& name, const std::string& description,
                      const std::string& example);
 // The same for a command that only holds others: one of them has to be given.
-CLI::App* AddCommandGroup(CLI::App& parent, const std::string& name,
-                          const std::string& description, const std::string& example);
+CLI::App* AddCommandGroup(CLI::App& parent, const std::string& name, const std::string& description,
+                          const std::string& example);
 // The option "--json" that everything that reads has.
 void AddJsonOption(CLI::App& command, bool& as_json);
 

@@ -34,7 +34,9 @@ void ListDevices(const Ctl& ctl, bool as_json) {
         entry["mountpoint"] = JsonText(device.mount_path);
         entry["device"] = JsonText(device.device_path);
         entry["uuid"] = JsonText(device.uuid);
-        entry["task_id"] = task == nullptr ? Json::Value() : Json::Value(static_cast<Json::UInt64>((*task)["id"].AsUInt64()));
+        entry["task_id"] = task == nullptr
+                               ? Json::Value()
+                               : Json::Value(static_cast<Json::UInt64>((*task)["id"].AsUInt64()));
         list.append(entry);
         table.Add({Printable(device.mount_path), Printable(device.device_path),
                    device.uuid.empty() ? "none" : Printable(device.uuid),
@@ -56,9 +58,9 @@ void AddDeviceCommands(CLI::App& program, const Ctl& ctl) {
     CLI::App* group = AddCommandGroup(program, "device", "The devices that are plugged in.",
                                       "ferrixctl device list");
     const auto as_json = std::make_shared<bool>(false);
-    CLI::App* list = AddCommand(*group, "list",
-                                "Lists what is plugged in, with its uuid and its task.",
-                                "ferrixctl device list");
+    CLI::App* list =
+        AddCommand(*group, "list", "Lists what is plugged in, with its uuid and its task.",
+                   "ferrixctl device list");
     AddJsonOption(*list, *as_json);
     list->callback([as_json, &ctl] { ListDevices(ctl, *as_json); });
 }

@@ -18,7 +18,8 @@ void AddHookCommand(CLI::App& program, const Ctl& ctl) {
     command->add_option("NAME", options->name, "What happens, \"post_mount\" for example")
         ->required();
     command->add_option("KEY=VALUE", options->keys, "What it happens to");
-    command->add_option("--type", options->type, "The kind of hook; taken from the name if not given")
+    command
+        ->add_option("--type", options->type, "The kind of hook; taken from the name if not given")
         ->check(CLI::IsMember(HOOK_TYPES));
     command->callback([options, &ctl] {
         const std::string type = options->type.empty() ? HookType(options->name) : options->type;

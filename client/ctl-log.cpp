@@ -136,9 +136,11 @@ void AddLogCommand(CLI::App& program, const Ctl& ctl) {
         "ferrixctl log --task Camera --limit 10\n"
         "ferrixctl log --grep IMG_1.JPG --limit 0 --json\n"
         "ferrixctl log --follow");
-    command->add_option("--task", options->task,
-                        "Only of this task: its id, or its name while the daemon runs; digits "
-                        "are an id");
+    command
+        ->add_option("--task", options->task,
+                     "Only of this task: its id, or its name while the daemon runs; digits "
+                     "are an id")
+        ->type_name("TASK");
     command->add_option("--since", options->since, "Only from this time on");
     CLI::Option* until = command->add_option(
         "--until", options->until, "Only up to this time; a day or a minute counts to its end");

@@ -146,14 +146,16 @@ void InitRepository(const std::string& volume) {
 }
 
 void AddRepositoryCommands(CLI::App& program) {
-    CLI::App* group = AddCommandGroup(program, "repo", "The repository: where the service keeps its "
+    CLI::App* group = AddCommandGroup(program, "repo",
+                                      "The repository: where the service keeps its "
                                       "tasks, their databases and its log.",
                                       "ferrixctl repo init /volume1");
     const auto volume = std::make_shared<std::string>();
-    CLI::App* init = AddCommand(*group, "init",
-                                "Makes an empty repository on a volume. \"service start\" does this "
-                                "by itself, on the first volume that it finds.",
-                                "ferrixctl repo init /volume1");
+    CLI::App* init =
+        AddCommand(*group, "init",
+                   "Makes an empty repository on a volume. \"service start\" does this "
+                   "by itself, on the first volume that it finds.",
+                   "ferrixctl repo init /volume1");
     init->add_option("VOLUME", *volume, "The volume's root folder")->required();
     init->callback([volume] { InitRepository(PathWithoutTrailingSlashes(*volume)); });
 }
@@ -161,8 +163,9 @@ void AddRepositoryCommands(CLI::App& program) {
 }  // namespace
 
 void AddServiceCommands(CLI::App& program) {
-    CLI::App* group = AddCommandGroup(program, "service", "Starts, stops, moves and reads the service.",
-                                      "ferrixctl service start\nferrixctl service status");
+    CLI::App* group =
+        AddCommandGroup(program, "service", "Starts, stops, moves and reads the service.",
+                        "ferrixctl service start\nferrixctl service status");
     AddCommand(*group, "start",
                "Finds or makes the repository, brings it to the present version, and starts the "
                "daemon. A service that runs is left alone.",
@@ -174,8 +177,10 @@ void AddServiceCommands(CLI::App& program) {
         ->callback(Stop);
 
     const auto as_json = std::make_shared<bool>(false);
-    CLI::App* status = AddCommand(*group, "status", "Tells what the service does, and where its "
-                                  "repository is.", "ferrixctl service status --json");
+    CLI::App* status = AddCommand(*group, "status",
+                                  "Tells what the service does, and where its "
+                                  "repository is.",
+                                  "ferrixctl service status --json");
     AddJsonOption(*status, *as_json);
     status->callback([as_json] { ShowStatus(*as_json); });
 

@@ -31,11 +31,13 @@ void AddSettingCommands(CLI::App& program, const Ctl& ctl) {
     CLI::App* group = AddCommandGroup(program, "setting", "Settings of the whole service.",
                                       "ferrixctl setting beep off");
     const auto options = std::make_shared<Options>();
-    CLI::App* beep = AddCommand(*group, "beep",
-                                "Switches the beep at the start and end of a run on or off, now and "
-                                "for good. Without a word it tells which.",
-                                "ferrixctl setting beep off\nferrixctl setting beep");
-    beep->add_option("STATE", options->value, "\"on\" or \"off\"")->check(CLI::IsMember({"on", "off"}));
+    CLI::App* beep =
+        AddCommand(*group, "beep",
+                   "Switches the beep at the start and end of a run on or off, now and "
+                   "for good. Without a word it tells which.",
+                   "ferrixctl setting beep off\nferrixctl setting beep");
+    beep->add_option("STATE", options->value, "\"on\" or \"off\"")
+        ->check(CLI::IsMember({"on", "off"}));
     AddJsonOption(*beep, options->as_json);
     beep->callback([options, &ctl] {
         if (!options->value.empty()) return SetBeepSetting(ctl, options->value == "on");

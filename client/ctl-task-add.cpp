@@ -50,12 +50,13 @@ void CheckStrategy(const AddOptions& options) {
                        options.task.keeps_folders || options.task.moves ||
                        !options.task.conflict.empty();
     if (sorts && options.strategy != "incremental") {
-        throw CommandError(EXIT_USAGE,
-                           "--date-folders, --rename, --keep-folders, --flat, --move and --conflict "
-                           "are for --strategy incremental");
+        throw CommandError(
+            EXIT_USAGE,
+            "--date-folders, --rename, --keep-folders, --flat, --move and --conflict "
+            "are for --strategy incremental");
     }
-    const bool rotates = options.task.versions || options.task.keeps_all_versions ||
-                         !options.task.rotation.empty();
+    const bool rotates =
+        options.task.versions || options.task.keeps_all_versions || !options.task.rotation.empty();
     if (rotates && options.strategy != "version") {
         throw CommandError(EXIT_USAGE,
                            "--versions, --all-versions and --rotation are for --strategy version");
@@ -69,9 +70,9 @@ void SetFolders(const AddOptions& options, PObject& request) {
     const std::string& share_side = options.is_export ? options.from : options.to;
     const std::string& device_side = options.is_export ? options.to : options.from;
     if (share_side.empty()) {
-        throw CommandError(EXIT_USAGE, options.is_export
-                                           ? "--export needs the folder to copy: --from SHARE/FOLDER"
-                                           : "where to? --to SHARE/FOLDER");
+        throw CommandError(
+            EXIT_USAGE, options.is_export ? "--export needs the folder to copy: --from SHARE/FOLDER"
+                                          : "where to? --to SHARE/FOLDER");
     }
     const ShareFolder folder = ParseShareFolder(share_side);
     request["hub_share_name"] = folder.share;
@@ -81,8 +82,8 @@ void SetFolders(const AddOptions& options, PObject& request) {
     std::string path;
     if (GetHubDirFullPath(folder.share, folder.folder, path) < 0 ||
         FSMKDirP(path, FS_KEEP_UID, FS_KEEP_GID) < 0) {
-        throw CommandError(EXIT_REFUSED, "the folder \"" + Printable(share_side) +
-                                             "\" could not be made");
+        throw CommandError(EXIT_REFUSED,
+                           "the folder \"" + Printable(share_side) + "\" could not be made");
     }
 }
 
@@ -98,8 +99,8 @@ PObject MakeRequest(const AddOptions& options, const PluggedDevice& device) {
     request["run_when_plug_in"] = !options.stays_quiet;
     request["eject_when_task_done"] = options.ejects;
     request["task_name"] = make.product.empty() ? PathBaseName(device.mount_path) : make.product;
-    request["task_type"] = static_cast<int>(options.is_export ? TASK_TYPE_EXPORT_GENERAL
-                                                              : TASK_TYPE_IMPORT_GENERAL);
+    request["task_type"] =
+        static_cast<int>(options.is_export ? TASK_TYPE_EXPORT_GENERAL : TASK_TYPE_IMPORT_GENERAL);
     request["copy_strategy"] = StrategyNumber(options.strategy);
     request["keep_dir_structure"] = true;
     request["smart_create_date_dir"] = false;
@@ -144,7 +145,8 @@ void AddTaskAddCommand(CLI::App& group, const Ctl& ctl) {
     const auto options = std::make_shared<AddOptions>();
     CLI::App* command = AddCommand(
         group, "add",
-        "Makes a task for a plugged-in device and prints its id. Without more than --to, everything "
+        "Makes a task for a plugged-in device and prints its id. Without more than --to, "
+        "everything "
         "on the only device is copied when it is plugged in, what has been copied before is not "
         "copied again, and nothing is ever removed.",
         "ferrixctl task add --to photos/inbox --name Camera --make-folder\n"

@@ -65,10 +65,11 @@ void AddTaskFilterCommands(CLI::App& group, const Ctl& ctl) {
     show->callback([shown, &ctl] { ShowFilter(ctl, shown->task, shown->as_json); });
 
     const auto options = std::make_shared<Options>();
-    CLI::App* set = AddCommand(*filter, "set",
-                               "Replaces the filter of a task; without options everything is "
-                               "copied. A run in progress goes by it from the next file on.",
-                               "ferrixctl task filter set Camera --exclude private --exclude-ext tmp");
+    CLI::App* set =
+        AddCommand(*filter, "set",
+                   "Replaces the filter of a task; without options everything is "
+                   "copied. A run in progress goes by it from the next file on.",
+                   "ferrixctl task filter set Camera --exclude private --exclude-ext tmp");
     AddTaskArgument(*set, options->task);
     AddFilterOptions(*set, options->filter);
     set->callback([options, &ctl] {

@@ -44,8 +44,8 @@ struct Switch {
 };
 
 constexpr Switch SWITCHES[] = {
-    {"keep_dir_structure",    "keeps the folders of the source"  },
-    {"smart_create_date_dir", "files go into folders by date"    },
+    {"keep_dir_structure",    "keeps the folders of the source"              },
+    {"smart_create_date_dir", "files go into folders by date"                },
     {"rename_photo_video",    "pictures and videos are renamed by their time"},
     {"remove_src_file",       "files are moved: they leave the source"       },
     {"run_when_plug_in",      "runs when the device is plugged in"           },

@@ -20,8 +20,9 @@ void SetTask(const Ctl& ctl, const SetOptions& options) {
     PObject request;
     SetTaskKeys(options.changes, request);
     if (request.IsNull() && options.to.empty()) {
-        throw CommandError(EXIT_USAGE, "say what to change; \"ferrixctl task set --help\" tells "
-                                       "what there is");
+        throw CommandError(EXIT_USAGE,
+                           "say what to change; \"ferrixctl task set --help\" tells "
+                           "what there is");
     }
     request["task_id"] = task["id"].AsUInt64();
     request["task_type"] = task["type"].AsInt32();
@@ -45,7 +46,8 @@ void AddTaskSetCommand(CLI::App& group, const Ctl& ctl) {
     CLI::App* command = AddCommand(
         group, "set",
         "Changes settings of a task; what is not named stays. The device, the source and the "
-        "strategy of a task cannot be changed. Fewer --versions remove the surplus at once. A change "
+        "strategy of a task cannot be changed. Fewer --versions remove the surplus at once. A "
+        "change "
         "of --to moves nothing that was copied.",
         "ferrixctl task set Camera --name \"Anna's camera\"\n"
         "ferrixctl task set 3 --to photos/anna --conflict overwrite\n"

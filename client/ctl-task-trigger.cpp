@@ -34,15 +34,15 @@ Timetable NewTimetable(const TriggerOptions& options, const PObject& task) {
 void CheckOptions(const TriggerOptions& options, const PObject& task) {
     if (!options.runs_on_plug_in && !options.ejects && options.time.empty() &&
         options.days.empty() && !options.has_no_timetable) {
-        throw CommandError(EXIT_USAGE, "say what to change; \"ferrixctl task trigger --help\" tells "
-                                       "what there is");
+        throw CommandError(EXIT_USAGE,
+                           "say what to change; \"ferrixctl task trigger --help\" tells "
+                           "what there is");
     }
     if (!options.days.empty() && options.time.empty()) {
         throw CommandError(EXIT_USAGE, "--days needs the time of the day: --at 02:30");
     }
     if (!options.time.empty() && task["schedule_id"].AsInt64() == NO_SCHEDULE) {
-        throw CommandError(EXIT_REFUSED,
-                           "a task that comes with the box cannot have a timetable");
+        throw CommandError(EXIT_REFUSED, "a task that comes with the box cannot have a timetable");
     }
 }
 
@@ -53,8 +53,10 @@ void SetTrigger(const Ctl& ctl, const TriggerOptions& options) {
     PObject request;
     request["task_id"] = task["id"].AsUInt64();
     // Always both: the daemon's live record forgets the one that is not sent.
-    request["run_when_plug_in"] = options.runs_on_plug_in.value_or(task["run_when_plug_in"].AsBool());
-    request["eject_when_task_done"] = options.ejects.value_or(task["eject_when_task_done"].AsBool());
+    request["run_when_plug_in"] =
+        options.runs_on_plug_in.value_or(task["run_when_plug_in"].AsBool());
+    request["eject_when_task_done"] =
+        options.ejects.value_or(task["eject_when_task_done"].AsBool());
     request["schedule_enabled"] = timetable.is_enabled;
     request["schedule_json_str"] = ScheduleText(timetable);
     (void)ctl.daemon.Ask("set_trigger_time_setting", std::move(request));

@@ -62,7 +62,8 @@ public:
             const Table::Cell status = StatusCell(look.task);
             line(Shortened(TaskLabel(look.task), columns / 3) + "  " +
                  m_terminal.Paint(status.colour, status.text) + "  " + ProgressText(look));
-            line("  " + Shortened(Printable(look.task["copy_file_path"].StringView()), columns - 2));
+            line("  " +
+                 Shortened(Printable(look.task["copy_file_path"].StringView()), columns - 2));
         }
         if (looks.empty()) line("No task runs.");
         // What the last look needed more is wiped.
@@ -93,7 +94,8 @@ public:
                 std::cout << JsonLine(LookJson(look)) << std::endl;
                 continue;
             }
-            std::string line = TimeText(time(nullptr)) + "  " + TaskLabel(look.task) + "  " + status;
+            std::string line =
+                TimeText(time(nullptr)) + "  " + TaskLabel(look.task) + "  " + status;
             const std::string progress = ProgressText(look);
             const std::string file = Printable(look.task["copy_file_path"].StringView());
             if (!progress.empty()) line += "  " + progress;
@@ -144,7 +146,8 @@ void AddTaskWatchCommand(CLI::App& group, const Ctl& ctl) {
     const auto options = std::make_shared<Options>();
     CLI::App* command = AddCommand(
         group, "watch",
-        "Follows a run: status, files and bytes done, rate, time, and the file in hand; on a terminal "
+        "Follows a run: status, files and bytes done, rate, time, and the file in hand; on a "
+        "terminal "
         "in place, else a line for each change. It waits for a run if none is under way, ends with "
         "it, and ends with 0 only if it was successful. Without a task it follows whatever runs.",
         "ferrixctl task watch Camera\n"

@@ -8,12 +8,13 @@ void AddTaskArgument(CLI::App& command, std::string& id_or_name) {
 }
 
 void AddTaskCommands(CLI::App& program, const Ctl& ctl) {
-    CLI::App* group = AddCommandGroup(
-        program, "task", "Tasks: what is copied between a device and a share. A device has one at "
-                         "most.",
-        "ferrixctl task list\n"
-        "ferrixctl task add --to photos/inbox --name Camera\n"
-        "ferrixctl task run Camera");
+    CLI::App* group =
+        AddCommandGroup(program, "task",
+                        "Tasks: what is copied between a device and a share. A device has one at "
+                        "most.",
+                        "ferrixctl task list\n"
+                        "ferrixctl task add --to photos/inbox --name Camera\n"
+                        "ferrixctl task run Camera");
     AddTaskListCommands(*group, ctl);
     AddTaskAddCommand(*group, ctl);
     AddTaskSetCommand(*group, ctl);

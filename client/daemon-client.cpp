@@ -10,9 +10,8 @@ PObject DaemonClient::Send(const std::string& what, const PObject& request) cons
     PObject response;
     if (DaemonIPC(m_socket_path).SendCommand(request, response) == 0) return response;
     if (response.HasMember("error")) {
-        throw CommandError(EXIT_REFUSED,
-                           ExplainRefusal(what, response["error_code"].AsInt32(),
-                                          Printable(response["error"].AsString())));
+        throw CommandError(EXIT_REFUSED, ExplainRefusal(what, response["error_code"].AsInt32(),
+                                                        Printable(response["error"].AsString())));
     }
     throw CommandError(EXIT_NOT_REACHABLE,
                        "the daemon does not answer at " + m_socket_path +

@@ -22,8 +22,8 @@ public:
     // The same for a command about one task.
     PObject AskAbout(const std::string& action, uint64_t task_id) const;
 
-    // Sends the hook `name` ("post_mount") of the type `type` ("volume_hook"). What the daemon makes
-    // of a hook stands in its log only.
+    // Sends the hook `name` ("post_mount") of the type `type` ("volume_hook"). What the daemon
+    // makes of a hook stands in its log only.
     void SendHook(const std::string& name, const std::string& type,
                   const std::vector<std::pair<std::string, std::string>>& keys) const;
 
@@ -31,8 +31,8 @@ public:
     [[nodiscard]] PObject::array_type Tasks() const;
     // The same; nothing when no daemon answers.
     [[nodiscard]] std::optional<PObject::array_type> TasksIfReachable() const;
-    // The description of the task with this id or, failing that, this name. EXIT_USAGE when there is
-    // none or the name is that of several.
+    // The description of the task with this id or, failing that, this name. EXIT_USAGE when there
+    // is none or the name is that of several.
     [[nodiscard]] PObject FindTask(const std::string& id_or_name) const;
 
 private:

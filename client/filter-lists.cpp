@@ -50,7 +50,8 @@ bool FilterOptions::IsEmpty() const {
 }
 
 void AddFilterOptions(CLI::App& command, FilterOptions& options) {
-    const auto add = [&command](const char* name, std::vector<std::string>& list, const char* text) {
+    const auto add = [&command](const char* name, std::vector<std::string>& list,
+                                const char* text) {
         command.add_option(name, list, text)->delimiter(',')->type_name("NAME,...");
     };
     add("--exclude", options.exclude_names, "Files and folders with these names are not copied");

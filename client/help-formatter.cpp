@@ -9,8 +9,8 @@ namespace {
 constexpr size_t COLUMNS = 80;
 constexpr size_t NAME_COLUMNS = 28;
 
-// The words in lines of at most COLUMNS, each but the first behind `indent` blanks; the first one has
-// `used` columns before it.
+// The words in lines of at most COLUMNS, each but the first behind `indent` blanks; the first one
+// has `used` columns before it.
 std::string Wrapped(const std::string& text, size_t indent, size_t used) {
     std::string wrapped;
     std::istringstream words(text);
@@ -63,7 +63,8 @@ public:
         std::string name = make_option_name(option, is_positional);
         if (option->get_type_size() != 0 && !is_positional) name += ' ' + option->get_type_name();
         std::string meaning = option->get_description();
-        if (!option->get_default_str().empty()) meaning += " (default " + option->get_default_str() + ")";
+        if (!option->get_default_str().empty())
+            meaning += " (default " + option->get_default_str() + ")";
         return Entry(name, meaning);
     }
 };

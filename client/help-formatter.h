@@ -1,5 +1,5 @@
-// How "--help" looks: no line is wider than a terminal, and lists of commands show the first sentence
-// of each.
+// How "--help" looks: no line is wider than a terminal, and lists of commands show the first
+// sentence of each.
 #pragma once
 
 #include <CLI/CLI.hpp>

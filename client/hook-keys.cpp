@@ -5,6 +5,17 @@
 #include "client/exit-status.h"
 #include "client/text.h"
 
+namespace {
+
+// What makes a request something else than this hook, and what would switch off the answer that
+// tells whether it was heard. A key loses a leading "_" on its way.
+bool IsReserved(const std::string& key) {
+    return key == "action" || key == "notify" || key == "type" || key == "need_ack" ||
+           key.front() == '_';
+}
+
+}  // namespace
+
 std::string HookType(const std::string& name) {
     static const std::pair<const char*, const char*> NAMES[] = {
         {"post_mount",            "volume_hook"},
@@ -25,7 +36,8 @@ std::string HookType(const std::string& name) {
         if (name == hook) return type;
         known += std::string(known.empty() ? "" : ", ") + hook;
     }
-    throw CommandError(EXIT_USAGE, "there is no hook \"" + Printable(name) + "\"; there are " + known);
+    throw CommandError(EXIT_USAGE,
+                       "there is no hook \"" + Printable(name) + "\"; there are " + known);
 }
 
 std::vector<std::pair<std::string, std::string>> HookKeys(const std::vector<std::string>& texts) {
@@ -36,8 +48,8 @@ std::vector<std::pair<std::string, std::string>> HookKeys(const std::vector<std:
             throw CommandError(EXIT_USAGE, "\"" + Printable(text) + "\" is no KEY=VALUE");
         }
         const std::string key = text.substr(0, at);
-        if (key == "action" || key == "notify" || key == "type") {
-            throw CommandError(EXIT_USAGE, "\"" + key + "\" is no key of a hook");
+        if (IsReserved(key)) {
+            throw CommandError(EXIT_USAGE, "\"" + Printable(key) + "\" is no key of a hook");
         }
         if (std::any_of(keys.begin(), keys.end(),
                         [&key](const auto& pair) { return pair.first == key; })) {

@@ -12,7 +12,7 @@ inline const std::vector<std::string> HOOK_TYPES = {"volume_hook", "ferrix_hook"
 [[nodiscard]] std::string HookType(const std::string& name);
 
 // "KEY=VALUE" texts taken apart at the first "="; a value may be empty. EXIT_USAGE for a text
-// without "=" or without a key, for a key given twice and for "action", "notify" and "type", which
-// are not the hook's own.
+// without "=" or without a key, for a key given twice and for keys that are not the hook's
+// own: "action", "notify", "type", "need_ack", and all that begin with "_".
 [[nodiscard]] std::vector<std::pair<std::string, std::string>> HookKeys(
     const std::vector<std::string>& texts);

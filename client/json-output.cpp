@@ -47,9 +47,8 @@ Json::Value ToJson(const PObject& value) {
         case PObject::KIND_MAP: {
             Json::Value json(Json::objectValue);
             for (const auto& [key, member] : value.AsMap()) {
-                const bool is_truth =
-                    std::find(std::begin(TRUTH_KEYS), std::end(TRUTH_KEYS), key) !=
-                    std::end(TRUTH_KEYS);
+                const bool is_truth = std::find(std::begin(TRUTH_KEYS), std::end(TRUTH_KEYS),
+                                                key) != std::end(TRUTH_KEYS);
                 json[JsonText(key).asString()] =
                     is_truth ? Json::Value(member.AsBool()) : ToJson(member);
             }

@@ -71,7 +71,7 @@ bool LogFile::HasNews() {
     const std::string path = LogPath();
     const State file = StateOf(path);
     if (file == State()) return false;
-    if (path != m_path || !file.IsSameFile(m_file)) {
+    if (!file.IsSameFile(m_file)) {
         m_db.Close();
         m_path = path;
         Open();

@@ -76,22 +76,15 @@ std::u16string Composed(std::string_view text) {
     return composed;
 }
 
-// Letters outside ASCII whose other case lies in it (the Kelvin sign) stay: the database, which
-// chooses first, keeps them apart.
-UChar32 WithoutCase(UChar32 c) {
-    const UChar32 folded = u_foldCase(c, U_FOLD_CASE_DEFAULT);
-    return c >= 0x80 && folded < 0x80 ? c : folded;
-}
-
+// Without upper case. The database, which chooses first, does so for ASCII alone: there a long s is
+// not an s.
 std::u16string Folded(const std::u16string& text) {
     std::u16string folded;
     const auto length = static_cast<int32_t>(text.size());
     for (int32_t at = 0; at < length;) {
         UChar32 c = 0;
         U16_NEXT(text.data(), at, length, c);
-        c = WithoutCase(c);
-        // How many of these stand for one damaged byte is not the same everywhere.
-        if (c == REPLACEMENT && !folded.empty() && folded.back() == REPLACEMENT) continue;
+        c = u_foldCase(c, U_FOLD_CASE_DEFAULT);
         if (c > 0xFFFF) {
             folded += static_cast<char16_t>(U16_LEAD(c));
             folded += static_cast<char16_t>(U16_TRAIL(c));

@@ -1,5 +1,6 @@
 #include "client/log-query.h"
 
+#include <numeric>
 #include <utility>
 
 #include "db/log-info.h"
@@ -10,9 +11,10 @@ namespace {
 // version may have written others, near them: they are numbered by subject, from 0, 100 and 1000.
 // Not simply every number: sqlite takes 1000 of them at most, and each costs a little.
 std::vector<int> Descriptions() {
-    std::vector<int> ids;
-    for (int id = 0; id < 200; ++id) ids.push_back(id);
-    for (int id = 1000; id < 1100; ++id) ids.push_back(id);
+    std::vector<int> ids(300);
+    const auto thousands = ids.begin() + 200;
+    std::iota(ids.begin(), thousands, 0);
+    std::iota(thousands, ids.end(), 1000);
     return ids;
 }
 

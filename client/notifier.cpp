@@ -27,25 +27,13 @@ uint64_t TaskId(const std::string& text) {
     return id;
 }
 
-// A hook is acknowledged, always: the status tells whether it was heard. "need_ack" would switch
-// that off, and a key loses a leading "_" on its way.
-void RefuseReserved(const std::vector<std::pair<std::string, std::string>>& keys) {
-    for (const auto& [key, value] : keys) {
-        if (key == "need_ack" || key.front() == '_') {
-            throw CommandError(EXIT_USAGE, "\"" + Printable(key) + "\" is no key of a hook");
-        }
-    }
-}
-
 void Notify(const DaemonClient& daemon, const Options& options) {
     if (!options.task_id.empty()) {
         (void)daemon.AskAbout("run_task", TaskId(options.task_id));
         return;
     }
     if (options.hook.empty()) throw CLI::RequiredError("--execute-task or --hook");
-    const auto keys = HookKeys(options.keys);
-    RefuseReserved(keys);
-    daemon.SendHook(options.hook, options.type, keys);
+    daemon.SendHook(options.hook, options.type, HookKeys(options.keys));
 }
 
 }  // namespace

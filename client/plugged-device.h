@@ -1,4 +1,5 @@
-// The storage devices that are plugged in and mounted now, as the platform tells them. Threads: any.
+// The storage devices that are plugged in and mounted now, as the platform tells them. Threads:
+// any.
 #pragma once
 
 #include <string>

@@ -63,7 +63,8 @@ void RunWatcher::Update(const PObject::array_type& tasks, const PObject& progres
         if (!look.is_active && (was_active || has_run)) {
             m_has_failed = task["task_status"].StringView() != "successful";
         }
-        if (m_task_id || look.is_active || was_active || has_run) m_looks.push_back(std::move(look));
+        if (m_task_id || look.is_active || was_active || has_run)
+            m_looks.push_back(std::move(look));
     }
     m_active = std::move(active);
 }

@@ -15,13 +15,13 @@
 
 // A task as it is at one look.
 struct TaskLook {
-    PObject task;                // the daemon's description
-    bool is_active = false;      // waits, copies or is being cancelled
-    bool has_progress = false;   // the numbers below are of its run
-    uint64_t files = 0;          // in their place
-    uint64_t bytes = 0;          // of these
+    PObject task;                   // the daemon's description
+    bool is_active = false;         // waits, copies or is being cancelled
+    bool has_progress = false;      // the numbers below are of its run
+    uint64_t files = 0;             // in their place
+    uint64_t bytes = 0;             // of these
     uint64_t bytes_per_second = 0;  // of late
-    uint64_t seconds = 0;        // since the run began
+    uint64_t seconds = 0;           // since the run began
 };
 
 class RunWatcher {

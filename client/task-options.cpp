@@ -7,9 +7,10 @@
 void AddSwitch(CLI::App& command, const std::string& name, const std::string& opposite,
                std::optional<bool>& value, const std::string& description,
                const std::string& opposite_description) {
-    CLI::Option* on = command.add_flag_callback(name, [&value] { value = true; }, description);
-    CLI::Option* off =
-        command.add_flag_callback(opposite, [&value] { value = false; }, opposite_description);
+    CLI::Option* on = command.add_flag_callback(
+        name, [&value] { value = true; }, description);
+    CLI::Option* off = command.add_flag_callback(
+        opposite, [&value] { value = false; }, opposite_description);
     on->excludes(off);
 }
 
@@ -27,26 +28,31 @@ void AddTaskOptions(CLI::App& command, TaskOptions& options) {
     AddSwitch(command, "--move", "--no-move", options.moves,
               "Incremental: files leave the source once their copies are proven to be on the disk",
               "Incremental: files stay in the source");
-    command.add_option("--conflict", options.conflict,
-                       "Incremental: what becomes of a file in the way: \"rename\" sets it aside, "
-                       "\"overwrite\" replaces it")
+    command
+        .add_option("--conflict", options.conflict,
+                    "Incremental: what becomes of a file in the way: \"rename\" sets it aside, "
+                    "\"overwrite\" replaces it")
         ->check(CLI::IsMember({"rename", "overwrite"}));
     CLI::Option* versions =
-        command.add_option("--versions", options.versions,
-                           "Version: how many versions are kept; older ones are removed")
+        command
+            .add_option("--versions", options.versions,
+                        "Version: how many versions are kept; older ones are removed")
             ->check(CLI::Range(uint64_t{1}, uint64_t{INT64_MAX}));
     command
-        .add_flag_callback("--all-versions", [&options] { options.keeps_all_versions = true; },
-                           "Version: nothing is removed")
+        .add_flag_callback(
+            "--all-versions", [&options] { options.keeps_all_versions = true; },
+            "Version: nothing is removed")
         ->excludes(versions);
-    command.add_option("--rotation", options.rotation,
-                       "Version: which go first: the \"oldest\", or a \"smart\" choice that keeps "
-                       "one an hour, a day, a week")
+    command
+        .add_option("--rotation", options.rotation,
+                    "Version: which go first: the \"oldest\", or a \"smart\" choice that keeps "
+                    "one an hour, a day, a week")
         ->check(CLI::IsMember({"smart", "oldest"}));
 }
 
 void SetTaskKeys(const TaskOptions& options, PObject& request) {
-    const bool is_sorted = options.uses_date_folders.value_or(false) || options.renames.value_or(false);
+    const bool is_sorted =
+        options.uses_date_folders.value_or(false) || options.renames.value_or(false);
     if (is_sorted && options.keeps_folders.value_or(false)) {
         throw CommandError(EXIT_USAGE,
                            "--keep-folders leaves every file where it lies: it does not go with "

@@ -12,8 +12,8 @@ class PObject;
 // The status, coloured by what it means.
 [[nodiscard]] Table::Cell StatusCell(const PObject& task);
 
-// Where a task copies from and to: "usbshare1:/DCIM" on its device ("device:/DCIM" while that is not
-// plugged in), "/photos/inbox" in a share.
+// Where a task copies from and to: "usbshare1:/DCIM" on its device ("device:/DCIM" while that is
+// not plugged in), "/photos/inbox" in a share.
 [[nodiscard]] std::string SourceText(const PObject& task);
 [[nodiscard]] std::string DestinationText(const PObject& task);
 

@@ -61,7 +61,8 @@ Timetable MakeTimetable(const std::string& time, const std::vector<std::string>&
     char rest = 0;
     if (sscanf(time.c_str(), "%2d:%2d%c", &hour, &minute, &rest) != 2 || hour < 0 || hour > 23 ||
         minute < 0 || minute > 59) {
-        throw CommandError(EXIT_USAGE, "\"" + Printable(time) + "\" is no time of the day: write "
+        throw CommandError(EXIT_USAGE, "\"" + Printable(time) +
+                                           "\" is no time of the day: write "
                                            "\"02:30\"");
     }
     std::array<bool, DAYS> days{};
@@ -104,8 +105,9 @@ std::string TimetableText(const Timetable& timetable) {
     const int hours = Number(schedule, "repeat_hour");
     const int minutes = Number(schedule, "repeat_min");
     if (hours != 0 || minutes != 0) {
-        text += ", again after " + DurationText(static_cast<uint64_t>(hours * 3600 + minutes * 60)) +
-                " until " + std::to_string(Number(schedule, "last_work_hour")) + " o'clock";
+        text += ", again after " +
+                DurationText(static_cast<uint64_t>(hours * 3600 + minutes * 60)) + " until " +
+                std::to_string(Number(schedule, "last_work_hour")) + " o'clock";
     }
     return text;
 }

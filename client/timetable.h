@@ -14,7 +14,8 @@ struct Timetable {
 
 // A timetable from "02:30" and days: names such as "mon", and ranges such as "mon-fri"; none are
 // all days. EXIT_USAGE (CommandError) for what is neither.
-[[nodiscard]] Timetable MakeTimetable(const std::string& time, const std::vector<std::string>& days);
+[[nodiscard]] Timetable MakeTimetable(const std::string& time,
+                                      const std::vector<std::string>& days);
 
 // The text of "schedule_json_str".
 [[nodiscard]] std::string ScheduleText(const Timetable& timetable);

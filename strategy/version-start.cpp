@@ -25,6 +25,7 @@ bool IsUnfinished(const TaskRunInfo& task, const std::string& name) {
 }  // namespace
 
 int NameNewVersion(const TaskRunInfo& task, time_t start, std::string& version_dir) {
+    tzset();  // the zone may have been changed since the last run
     for (int second = 0; second < TRIES; ++second) {
         std::string name;
         if (NameVersion(start + second, name) < 0) return -1;

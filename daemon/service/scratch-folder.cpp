@@ -46,7 +46,7 @@ std::string ScratchFolder::Numbered(const char* name, int number) const {
 // Empty when all are taken.
 std::string ScratchFolder::FreeName(const char* name) const {
     for (int number = 1; number <= MAX_NUMBER; ++number) {
-        const std::string path = Numbered(name, number);
+        std::string path = Numbered(name, number);
         if (!FSExists(path)) return path;
     }
     return "";

@@ -44,8 +44,14 @@ PObject Map(std::initializer_list<std::pair<const char*, PObject>> members) {
 
 PObject TaskList(std::initializer_list<std::pair<uint64_t, const char*>> tasks) {
     PObject::array_type list;
-    for (const auto& [id, name] : tasks) list.push_back(Map({{"id", id}, {"task_name", name}}));
-    PObject answer = Map({{"ack", "ok"}});
+    for (const auto& [id, name] : tasks)
+        list.push_back(Map({
+            {"id",        id  },
+            {"task_name", name}
+        }));
+    PObject answer = Map({
+        {"ack", "ok"}
+    });
     answer["task_list"] = list;
     return answer;
 }
@@ -70,15 +76,26 @@ protected:
 }  // namespace
 
 TEST_F(DaemonClientTest, AsksAndGivesTheAnswerBack) {
-    OneAnswer daemon(m_path, Map({{"ack", "ok"}, {"task_id", 7}}));
-    EXPECT_EQ(7U, m_client.Ask("add_task", Map({{"uuid", "x"}}))["task_id"].AsUInt64());
+    OneAnswer daemon(m_path, Map({
+                                 {"ack",     "ok"},
+                                 {"task_id", 7   }
+    }));
+    EXPECT_EQ(7U, m_client
+                      .Ask("add_task", Map({
+                                           {"uuid", "x"}
+    }))["task_id"]
+                      .AsUInt64());
     EXPECT_EQ("add_task", daemon.Request()["action"].AsString());
     EXPECT_EQ("x", daemon.Request()["uuid"].AsString());
 }
 
 TEST_F(DaemonClientTest, ARefusalHoldsTheDaemonsTextAndWhatToDo) {
     OneAnswer daemon(
-        m_path, Map({{"ack", "ok"}, {"error", "Duplicated destination path"}, {"error_code", 9}}));
+        m_path, Map({
+                    {"ack",        "ok"                         },
+                    {"error",      "Duplicated destination path"},
+                    {"error_code", 9                            }
+    }));
     const auto [status, text] = EndOf([this] { (void)m_client.AskAbout("run_task", 3); });
     EXPECT_EQ(EXIT_REFUSED, status);
     EXPECT_THAT(text, HasSubstr("Duplicated destination path: "));
@@ -87,7 +104,11 @@ TEST_F(DaemonClientTest, ARefusalHoldsTheDaemonsTextAndWhatToDo) {
 }
 
 TEST_F(DaemonClientTest, ARefusalCannotSteerTheTerminal) {
-    OneAnswer daemon(m_path, Map({{"ack", "ok"}, {"error", "\033[2J"}, {"error_code", 99}}));
+    OneAnswer daemon(m_path, Map({
+                                 {"ack",        "ok"     },
+                                 {"error",      "\033[2J"},
+                                 {"error_code", 99       }
+    }));
     const auto [status, text] = EndOf([this] { (void)m_client.Ask("stop"); });
     EXPECT_EQ(EXIT_REFUSED, status);
     EXPECT_THAT(text, Not(HasSubstr("\033")));
@@ -100,8 +121,14 @@ TEST_F(DaemonClientTest, NoDaemonIsNotReachable) {
 }
 
 TEST_F(DaemonClientTest, AHookIsSentWithItsKindAndKeys) {
-    OneAnswer daemon(m_path, Map({{"ack", "ok"}}));
-    m_client.SendHook("post_mount", "volume_hook", {{"mountpoint", "/m"}, {"device", "/dev/x"}});
+    OneAnswer daemon(m_path, Map({
+                                 {"ack", "ok"}
+    }));
+    m_client.SendHook("post_mount", "volume_hook",
+                      {
+                          {"mountpoint", "/m"    },
+                          {"device",     "/dev/x"}
+    });
     EXPECT_EQ("post_mount", daemon.Request()["notify"].AsString());
     EXPECT_EQ("volume_hook", daemon.Request()["type"].AsString());
     EXPECT_EQ("/m", daemon.Request()["mountpoint"].AsString());
@@ -109,21 +136,32 @@ TEST_F(DaemonClientTest, AHookIsSentWithItsKindAndKeys) {
 }
 
 TEST_F(DaemonClientTest, ATaskIsFoundByItsIdBeforeItsName) {
-    OneAnswer daemon(m_path, TaskList({{1, "2"}, {2, "Camera"}}));
+    OneAnswer daemon(m_path, TaskList({
+                                 {1, "2"     },
+                                 {2, "Camera"}
+    }));
     EXPECT_EQ("Camera", m_client.FindTask("2")["task_name"].AsString());
 }
 
 TEST_F(DaemonClientTest, ATaskIsFoundByItsName) {
-    OneAnswer daemon(m_path, TaskList({{1, "Stick"}, {2, "Camera"}}));
+    OneAnswer daemon(m_path, TaskList({
+                                 {1, "Stick" },
+                                 {2, "Camera"}
+    }));
     EXPECT_EQ(2U, m_client.FindTask("Camera")["id"].AsUInt64());
 }
 
 TEST_F(DaemonClientTest, ANameOfTwoTasksIsNotGuessed) {
-    OneAnswer daemon(m_path, TaskList({{1, "Camera"}, {2, "Camera"}}));
+    OneAnswer daemon(m_path, TaskList({
+                                 {1, "Camera"},
+                                 {2, "Camera"}
+    }));
     EXPECT_EQ(EXIT_USAGE, EndOf([this] { (void)m_client.FindTask("Camera"); }).first);
 }
 
 TEST_F(DaemonClientTest, ATaskThatIsNotThereIsAWrongWord) {
-    OneAnswer daemon(m_path, TaskList({{1, "Camera"}}));
+    OneAnswer daemon(m_path, TaskList({
+                                 {1, "Camera"}
+    }));
     EXPECT_EQ(EXIT_USAGE, EndOf([this] { (void)m_client.FindTask("camera"); }).first);
 }

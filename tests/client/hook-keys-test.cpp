@@ -20,13 +20,17 @@ ExitStatus StatusOf(const std::function<void()>& command) {
 }  // namespace
 
 TEST(HookKeysTest, AreTakenApartAtTheFirstEqualsSign) {
-    EXPECT_EQ((Keys{{"mountpoint", "/media/a=b"}, {"device", ""}}),
+    EXPECT_EQ((Keys{
+                  {"mountpoint", "/media/a=b"},
+                  {"device",     ""          }
+    }),
               HookKeys({"mountpoint=/media/a=b", "device="}));
     EXPECT_EQ(Keys{}, HookKeys({}));
 }
 
 TEST(HookKeysTest, WhatIsNoKeyAndValueIsRefused) {
-    for (const char* text : {"mountpoint", "=value", "", "action=stop", "notify=x", "type=x"}) {
+    for (const char* text : {"mountpoint", "=value", "", "action=stop", "notify=x", "type=x",
+                             "need_ack=", "_action=stop"}) {
         EXPECT_EQ(EXIT_USAGE, StatusOf([text] { (void)HookKeys({text}); })) << text;
     }
     EXPECT_EQ(EXIT_USAGE, StatusOf([] { (void)HookKeys({"a=1", "a=2"}); })) << "given twice";

@@ -36,13 +36,10 @@ protected:
         row.timestamp = 1;
         ASSERT_EQ(0, db.AddLogInfo(row));
     }
-    // As if nothing had been written for an hour.
-    void MakeOld() const {
-        for (const std::string& path : {m_path, m_path + "-wal"}) {
-            if (!std::filesystem::exists(path)) continue;
-            std::filesystem::last_write_time(
-                path, std::filesystem::file_time_type::clock::now() - std::chrono::hours(1));
-        }
+    // As if nothing had been written for so long.
+    static void MakeOld(const std::string& path, int hours) {
+        std::filesystem::last_write_time(
+            path, std::filesystem::file_time_type::clock::now() - std::chrono::hours(hours));
     }
     static uint64_t RowsOf(LogFile& file) {
         LogFilter filter;
@@ -89,13 +86,23 @@ TEST_F(LogFileTest, NewRowIsNewsAndAnOldLogIsNot) {
     LogFile file;
     EXPECT_EQ(1U, RowsOf(file));
     EXPECT_TRUE(file.HasNews()) << "a row may have come within the same tick of the clock";
-    MakeOld();
+    const std::string journal = m_path + "-wal";
+    MakeOld(m_path, 2);
+    MakeOld(journal, 2);
     EXPECT_TRUE(file.HasNews()) << "the times changed";
     EXPECT_FALSE(file.HasNews());
     EXPECT_FALSE(file.HasNews());
     AddRow(m_path);
     EXPECT_TRUE(file.HasNews());
     EXPECT_EQ(2U, RowsOf(file));
+    MakeOld(m_path, 2);
+    MakeOld(journal, 2);
+    EXPECT_TRUE(file.HasNews());
+    MakeOld(journal, 1);
+    EXPECT_TRUE(file.HasNews()) << "written to long before this look, but after the last";
+    MakeOld(m_path, 1);
+    EXPECT_TRUE(file.HasNews());
+    EXPECT_FALSE(file.HasNews());
 }
 
 TEST_F(LogFileTest, LogThatWasReplacedIsOpenedAnew) {

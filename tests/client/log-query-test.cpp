@@ -208,6 +208,13 @@ TEST_F(LogQueryTest, UpperAndLowerCaseAreTheSame) {
     EXPECT_THAT(WithText("москва"), ElementsAre(4));
 }
 
+TEST_F(LogQueryTest, NameThatIsNoUtf8IsFoundByItsOwnBytes) {
+    AddFiles({"\xC4nderung.jpg", "\xC3\x84nderung.jpg", "nderung.jpg", "\xF0\x9F\x93"});
+    EXPECT_THAT(WithText("\xC4nderung"), ElementsAre(1)) << "in an old encoding";
+    EXPECT_THAT(WithText("erung.jpg"), ElementsAre(1, 2, 3));
+    EXPECT_THAT(WithText("\xF0\x9F\x93"), ElementsAre(4));
+}
+
 TEST_F(LogQueryTest, TextCopiedFromASentenceIsFound) {
     AddFiles({"a\nb.jpg", "say \"no\"", "\u202Egpj.exe", "a\\x0ab.jpg"});
     EXPECT_THAT(WithText("a\\x0ab.jpg"), ElementsAre(1, 4));

@@ -81,6 +81,26 @@ TEST_F(LogTailTest, ManyRowsAtOnceAreAllFound) {
     EXPECT_EQ(256U, News().size()) << "after a second of 1000 equal rows";
 }
 
+// A look at the log begins with 256 rows: the last of them looks like the newest that was seen.
+TEST_F(LogTailTest, RowThatOnlyLooksLikeASeenOneIsNews) {
+    AddFile("x", 3);
+    AddFile("x", 4);
+    Begin();
+    for (uint32_t i = 0; i < 10; ++i) AddFile("x", 4);
+    for (uint32_t i = 0; i < 255; ++i) AddFile("x", 5);
+    EXPECT_EQ(265U, News().size());
+    EXPECT_THAT(News(), IsEmpty());
+}
+
+TEST_F(LogTailTest, RowsThatOnlyLookLikeTheWholeSeenLogAreNews) {
+    for (uint32_t i = 0; i < 5; ++i) AddFile("x", 4);
+    Begin();
+    for (uint32_t i = 0; i < 20; ++i) AddFile("x", 4);
+    for (uint32_t i = 0; i < 251; ++i) AddFile("x", 5);
+    EXPECT_EQ(271U, News().size());
+    EXPECT_THAT(News(), IsEmpty());
+}
+
 TEST_F(LogTailTest, RowsThatAreRotatedAwayAreNoNews) {
     ASSERT_EQ(0, m_db.SetRotateCount(10));
     for (uint32_t i = 1; i <= 10; ++i) AddFile("a" + std::to_string(i), i);

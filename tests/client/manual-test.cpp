@@ -6,6 +6,7 @@
 #include "client/notifier.h"
 #include "demo-program.h"
 #include "manual/command-tree.h"
+#include "manual/completion.h"
 #include "manual/man-page.h"
 #include "manual/page-texts.h"
 #include "manual/roff.h"
@@ -258,4 +259,22 @@ TEST_F(PageTest, WhatTheParserChecksIsTold) {
     EXPECT_THAT(shown, HasSubstr("demo-ctl send [--type TEXT] NAME [KEY=VALUE...] "));
     EXPECT_THAT(shown, Not(HasSubstr("secret")));
     EXPECT_THAT(shown, Not(HasSubstr("--hidden")));
+}
+
+TEST(FerrixctlCompletionTest, TheScriptsOfTheRealCommandsWork) {
+    if (!HasProgram("bash") || !HasProgram("zsh")) GTEST_SKIP() << "bash or zsh is not installed";
+    const Ctl ctl{DaemonClient(), Terminal(STDOUT_FILENO)};
+    const CommandInfo tree = ReadCommandTree(*MakeCtlProgram(ctl));
+    EXPECT_TRUE(CanListTasks(tree));
+    const TempDir folder;
+    const std::string zsh_script = folder.Write("_ferrixctl", ZshCompletion(tree));
+    EXPECT_EQ("", RunShell("zsh -n " + zsh_script).output);
+    const std::string ask =
+        folder.Write("ask", BashCompletion(tree) +
+                                "COMP_WORDS=(ferrixctl task add --strategy ''); COMP_CWORD=4\n"
+                                "_ferrixctl; echo \"${COMPREPLY[@]}\"\n"
+                                "COMP_WORDS=(ferrixctl service st); COMP_CWORD=2\n"
+                                "_ferrixctl; echo \"${COMPREPLY[@]}\"\n");
+    EXPECT_EQ("incremental mirror version\nstart stop status\n",
+              RunShell("bash --noprofile --norc " + ask).output);
 }

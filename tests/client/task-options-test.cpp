@@ -57,14 +57,15 @@ TEST(TaskOptionsTest, SortedFilesDoNotKeepTheFoldersOfTheSource) {
 
 TEST(TaskOptionsTest, WhatContradictsItselfOrIsOutOfRangeIsRefused) {
     for (const std::vector<std::string>& words : std::vector<std::vector<std::string>>{
-             {"--move", "--no-move"},
-             {"--rename", "--no-rename"},
-             {"--versions", "5", "--all-versions"},
-             {"--versions", "0"},
-             {"--versions", "-1"},
-             {"--versions", "9223372036854775808"},
-             {"--conflict", "keep"},
-             {"--rotation", "none"}}) {
+             {"--move",     "--no-move"  },
+             {"--rename",   "--no-rename"},
+             {"--versions", "5",           "--all-versions"},
+             {"--versions",            "0"             },
+             {"--versions",            "-1"},
+             {"--versions",            "9223372036854775808"             },
+             {"--conflict",            "keep"},
+             {"--rotation",            "none"             }
+    }) {
         EXPECT_THROW(Parsed(words), CLI::ParseError) << words.back();
     }
 }

@@ -13,7 +13,8 @@ TEST(PrintableTest, PlainNamesStayAsTheyAre) {
 TEST(PrintableTest, WhatATerminalWouldObeyIsShownAsBytes) {
     EXPECT_EQ("\\x1b[2Jgone", Printable("\033[2Jgone"));
     EXPECT_EQ("a\\x0ab\\x09c\\x00d\\x7f", Printable(std::string_view("a\nb\tc\0d\x7f", 8)));
-    EXPECT_EQ("\\xe2\\x80\\xaegpj.exe", Printable("\u202Egpj.exe")) << "turns the reading direction";
+    EXPECT_EQ("\\xe2\\x80\\xaegpj.exe", Printable("\u202Egpj.exe"))
+        << "turns the reading direction";
     EXPECT_EQ("\\xc2\\x9b31m", Printable("\u009B31m")) << "an escape in one character";
 }
 

@@ -43,6 +43,7 @@ TEST(TimetableTest, OthersMadeThemWithDatesAndRepeats) {
     timetable.schedule["repeat_date"] = 1002;
     timetable.schedule["repeat_min"] = 30;
     timetable.schedule["last_work_hour"] = 18;
-    EXPECT_EQ("08:00 on 2026/11/21 and again from then on, again after 30 min 00 s until 18 o'clock",
-              TimetableText(timetable));
+    EXPECT_EQ(
+        "08:00 on 2026/11/21 and again from then on, again after 30 min 00 s until 18 o'clock",
+        TimetableText(timetable));
 }

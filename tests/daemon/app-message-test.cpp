@@ -31,9 +31,9 @@ TEST_F(MessageTest, TheTablesHoldWhatThisDaemonCanDo) {
     EXPECT_THAT(
         FerrixdPeer::Actions(m_app),
         ElementsAre("add_task", "cancel_task", "disable_task", "enable_task", "get_filter_setting",
-                    "get_task_setting", "link", "list_entry", "list_task", "remove_task",
-                    "run_task", "set_filter_setting", "set_global_setting", "set_task_setting",
-                    "set_trigger_time_setting", "stop"));
+                    "get_task_progress", "get_task_setting", "link", "list_entry", "list_task",
+                    "remove_task", "run_task", "set_filter_setting", "set_global_setting",
+                    "set_task_setting", "set_trigger_time_setting", "stop"));
     EXPECT_THAT(
         FerrixdPeer::Hooks(m_app),
         ElementsAre("post_decrypt", "post_ferrix", "post_mount", "post_path_change",

@@ -223,13 +223,16 @@ TEST_F(AddTaskTest, WhatATaskOfTheSameNumberHadCopiedIsForgotten) {
     {
         FileDB left;
         ASSERT_EQ(0, left.Init(path));
-        ASSERT_EQ(0, left.SetFileInfoBySourcePath({"/d", "/d", FILE_INFO_DIR, 0, 0}));
+        ASSERT_EQ(0, left.SetFileInfoBySourcePath({"/a.jpg", "/a.jpg", FILE_INFO_FILE, 1, 1}));
+        int64_t mark = 0;
+        ASSERT_EQ(0, left.GetUnprovenMark(mark));
+        ASSERT_EQ(0, left.ProveFileInfo(mark));
     }
     const std::string proof = m_dir.Write("v1/@Ferrix/task/1/unproven-run", "1 2 3\n");
     ASSERT_THAT(Add([](PObject& request) { request["copy_strategy"] = 3; }), IsSuccess());
     ASSERT_NE(nullptr, Entry(1).file_db);
     FileInfo info;
-    EXPECT_EQ(0, Entry(1).file_db->GetFileInfoBySourcePath("/d", info));
+    EXPECT_EQ(0, Entry(1).file_db->GetFileInfoBySourcePath("/a.jpg", info));
     EXPECT_EQ("1 2 3\n", ReadWholeFile(proof)) << "what is not trusted stays so";
 }
 

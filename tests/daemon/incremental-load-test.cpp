@@ -46,8 +46,11 @@ TEST_F(IncrementalLoadTest, AnEntryHasItsStrategyAndItsFileDatabase) {
 }
 
 TEST_F(IncrementalLoadTest, RecordsOutliveTheEntry) {
-    ASSERT_EQ(0,
-              Entry(m_task_id).file_db->SetFileInfoBySourcePath({"/d", "/d", FILE_INFO_DIR, 0, 0}));
+    const auto records = Entry(m_task_id).file_db;
+    ASSERT_EQ(0, records->SetFileInfoBySourcePath({"/d", "/d", FILE_INFO_DIR, 0, 0}));
+    int64_t mark = 0;
+    ASSERT_EQ(0, records->GetUnprovenMark(mark));
+    ASSERT_EQ(0, records->ProveFileInfo(mark));
     ForgetEntries();
     ASSERT_EQ(0, PostMount("a"));
     FileInfo info;

@@ -62,7 +62,7 @@ TEST_F(DaemonStartTest, WithoutADaemonTheWaitEndsInAFailure) {
     ExpectFailsWithin(30);
     OnDaemonProgram([this] { m_dir.Write("daemon.pid", ""); });
     ExpectFailsWithin(30);
-    ChildDaemon(m_dir / "other.pid", ChildDaemon::ENDS_AT_SIGTERM);
+    { const ChildDaemon ended(m_dir / "other.pid", ChildDaemon::ENDS_AT_SIGTERM); }
     const int gone = std::stoi(ReadWholeFile(m_dir / "other.pid"));
     OnDaemonProgram([this, gone] { WritePidFile(gone); });
     ExpectFailsWithin(30);

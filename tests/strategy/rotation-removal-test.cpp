@@ -261,14 +261,20 @@ TEST_F(RotationTurnTest, ASecondRotationWaitsForTheFirst) {
 }
 
 TEST_F(RotationTurnTest, AnAbortEndsTheWait) {
-    std::thread second([this] { EXPECT_EQ(ERR_INTERRUPTED, RotateToo()); });
+    std::atomic<bool> is_ended{false};
+    std::thread second([&] {
+        EXPECT_EQ(ERR_INTERRUPTED, RotateToo());
+        is_ended = true;
+    });
     usleep(50000);
     m_second_abort = 1;
-    second.join();
+    for (int step = 0; step < 5000 && !is_ended; ++step) usleep(1000);
+    EXPECT_TRUE(is_ended) << "with the first still at work";
     EXPECT_TRUE(
         m_log.Has("[WARN] RotationHandler: user stopped while waiting for another rotation"));
     EXPECT_EQ(1, Lists());
-    EXPECT_TRUE(IsThere(Version("02")));
+    Release();
+    second.join();
 }
 
 }  // namespace

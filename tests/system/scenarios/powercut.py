@@ -120,8 +120,9 @@ def test_no_record_outlives_its_file(box):
                     box.stop()
         print(f"{CUTS} cuts: {kept} records kept, {doubted} forgotten, {torn} of these without their"
               f" whole file; {partly} cuts in the middle")
-        # Without these the cuts would have shown nothing.
-        assert torn > 0 and partly > CUTS // 20, (kept, doubted, torn, partly)
+        # Without these the cuts would have shown nothing. Whether a file that is in doubt has really
+        # lost something is the chance of the cut.
+        assert doubted > CUTS // 20 and partly > CUTS // 20, (kept, doubted, torn, partly)
 
 
 test_no_record_outlives_its_file.long = True
