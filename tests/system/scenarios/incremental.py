@@ -7,7 +7,7 @@ import shutil
 import sqlite3
 
 from ferrix import tree
-from ferrix.box import wait_until
+from ferrix.box import sh, wait_until
 
 OVERWRITE, RENAME = 2, 1
 MAY_6 = 1683356889  # 2023-05-06 07:08:09 UTC
@@ -381,3 +381,41 @@ def test_a_database_that_is_damaged_is_refused(box):
     with open(path, "rb") as content:
         assert content.read() == b"no database " * 1000
     same(files(share), {"/a": b"a"})
+
+
+def vanish(box, **options):
+    """A card that goes in the middle of a run without a word, and comes back."""
+    share, card, task = prepare(box, size_mb=300, conflict_policy=RENAME, **options)
+    rng = tree.rng(17)
+    wanted = {}
+    for number in range(400):
+        name = f"/DCIM/img{number:03}.jpg"
+        wanted[name] = rng.randbytes(300000)
+        write(card.path(name[1:]), wanted[name], MAY_6 + 2 * number)
+    write(share + "/kept.txt", b"of the owner")
+    card.hook("post_mount")
+    wait_until(lambda: os.path.isdir(share + "/DCIM") and len(os.listdir(share + "/DCIM")) > 20,
+               60, 0.002)
+    sh("umount", "-l", card.mountpoint)
+    card.mounted = False
+    assert box.log.expect("HandleError: task_err_code = -22", timeout=120)
+    wait_until(lambda: box.log_rows("description_id = 103"), 60)
+    found = files(share)
+    assert found.pop("/kept.txt") == b"of the owner" and len(found) < len(wanted)
+    assert found.items() <= wanted.items(), "what is there is whole"
+    card.hook("pre_unmount")
+    card.mount()
+    box.runs = 1
+    run(box, card, task)
+    same(files(share), {**wanted, "/kept.txt": b"of the owner"})
+    return card
+
+
+def test_a_card_that_vanishes_during_a_run(box):
+    """The run fails, what was copied is whole, and the next run ends as an undisturbed one."""
+    assert len(files(vanish(box).mountpoint)) == 400
+
+
+def test_a_card_that_vanishes_while_it_is_emptied(box):
+    """The same with files that are moved: none is lost, none comes twice, the card is empty after."""
+    assert not files(vanish(box, remove_src_file=True).mountpoint)
