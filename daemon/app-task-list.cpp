@@ -37,6 +37,12 @@ Mounts GetMounts(uint64_t task_id) {
 // The status of a loaded task that nothing works on.
 const char* IdleStatus(const TaskInfo& task) {
     if (TaskEventManager::GetInstance().IsInReadyQueue(task.id)) return "waiting";
+    // It may have left the queue since its state was read: the state was set before it left.
+    TaskRunInfo entry;
+    if (TaskEntryHandler::GetInstance().GetTaskEntry(task.id, entry) == 0 &&
+        entry.status == TASK_RUN_STATE_RUNNING) {
+        return "copying";
+    }
     if (task.error != 0) return "failed";
     return task.last_copied_time == 0 ? "initial" : "successful";
 }
@@ -96,6 +102,21 @@ void SetPaths(const TaskInfo& task, PObject& response) {
     response["destination_path"] = destination;
 }
 
+// A run may have ended since the row was read. Its result is in the row before its state is idle.
+TaskInfo WithLatestResult(const TaskInfo& listed) {
+    TaskRunInfo entry;
+    TaskInfo latest;
+    if (TaskEntryHandler::GetInstance().GetTaskEntry(listed.id, entry) < 0 ||
+        entry.status != TASK_RUN_STATE_IDLE ||
+        TaskDB::GetInstance().GetTaskInfo(listed.id, latest) != 1) {
+        return listed;
+    }
+    TaskInfo task = listed;
+    task.error = latest.error;
+    task.last_copied_time = latest.last_copied_time;
+    return task;
+}
+
 // The file that is being copied for this task, if the worker has one of it in hand. The worker goes
 // on meanwhile: the path is taken only when the task is the same after it was read.
 std::string CopyFilePath(uint64_t task_id, const FileProcessor* file_processor) {
@@ -106,8 +127,9 @@ std::string CopyFilePath(uint64_t task_id, const FileProcessor* file_processor) 
 
 }  // namespace
 
-int Ferrixd::GetTaskResponse(const TaskInfo& task_info, FileProcessor* file_processor,
+int Ferrixd::GetTaskResponse(const TaskInfo& listed, FileProcessor* file_processor,
                              PObject& response) {
+    const TaskInfo task_info = WithLatestResult(listed);
     USBInfo usb_info;
     if (!FindUSB(task_info.usb_id, usb_info, response)) return -1;
     const Mounts mounts = GetMounts(task_info.id);

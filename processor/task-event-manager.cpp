@@ -36,7 +36,7 @@ void TaskEventManager::PushEvent(uint64_t task_id) {
     EnqueueLocked(task_id);
 }
 
-int TaskEventManager::PullEvent(uint64_t& task_id) {
+int TaskEventManager::PullEvent(uint64_t& task_id, void (*on_pull)(uint64_t)) {
     const MutexLock lock(m_mutex);
     if (m_ready_queue.empty()) {
         SLOG_DBG("TaskEventManager: m_ready_queue is empty\n");
@@ -55,6 +55,7 @@ int TaskEventManager::PullEvent(uint64_t& task_id) {
     m_processing_set.insert(first);
     task_id = first;
     SLOG_DBG("TaskEventManager: PullEvent '%llu'\n", Llu(task_id));
+    if (on_pull != nullptr) on_pull(task_id);
     return 1;
 }
 

@@ -55,8 +55,10 @@ int TaskProcessor::GetEvent() {
         return 0;
     }
     uint64_t task_id = 0;
-    if (TaskEventManager::GetInstance().PullEvent(task_id) != 1) return -1;
-    TaskEntryHandler::GetInstance().SetTaskState(task_id, TASK_RUN_STATE_RUNNING);
+    const auto set_running = [](uint64_t pulled) {
+        TaskEntryHandler::GetInstance().SetTaskState(pulled, TASK_RUN_STATE_RUNNING);
+    };
+    if (TaskEventManager::GetInstance().PullEvent(task_id, set_running) != 1) return -1;
     Ferrix::ErrorHandler::GetInstance().Clear(task_id);
     RunProgress::GetInstance().Begin(task_id);
     m_task_event.task_id = task_id;
