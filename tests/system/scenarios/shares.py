@@ -79,7 +79,13 @@ def start(box, files=20, size=None, device_mb=64, **add):
     return share, stick, box.add_mirror(stick, **add)
 
 
-def begin(box, task, share, stick):
+def assert_stopped(box, task, device):
+    """Workers that have been at work do nothing for the task any more."""
+    assert box.log.expect(activity(device)), "a line of its work was never seen"
+    assert_still(box, task, device)
+
+
+def begin(box, task, share):
     """Runs the task and returns when it is in the middle of its copies."""
     done(box.ask("run_task", task_id=task))
     wait_until(lambda: len(os.listdir(share.path)) > 10, 60, 0.01, "some copies")
@@ -97,7 +103,6 @@ def activity(device):
 
 def assert_still(box, task, device, seconds=0.3):
     """No worker does anything for the task any more."""
-    assert box.log.expect(activity(device)), "a line of its work was never seen"
     time.sleep(0.1)  # lines of what was done before are sent in groups
     mark = box.log.mark()
     time.sleep(seconds)
@@ -135,7 +140,7 @@ def test_a_share_is_renamed_during_a_run(box):
     """The run ends at once with nothing half done, is not started again by itself, and can be run
     again to a good end under the new name."""
     share, stick, task = start(box, files=150, size=1 << 20, device_mb=300)
-    begin(box, task, share, stick)
+    begin(box, task, share)
     hook("pre_path_change", "photos")
     count = len(os.listdir(share.path))
     assert count < 150
@@ -199,7 +204,7 @@ def test_a_share_is_restored_during_a_run(box):
     share, stick, task = start(box, files=150, size=1 << 20, device_mb=300)
     for number, kind in enumerate(("snapshot_restore", "transform")):
         share.empty()
-        begin(box, task, share, stick)
+        begin(box, task, share)
         hook("pre_" + kind, "photos")
         assert stopped_rows(box) == number + 1
         no_half_files(stick, share.path)
@@ -208,7 +213,7 @@ def test_a_share_is_restored_during_a_run(box):
         tree.write(share.store + "/img0000", tree.rng(9), 1000)
         share.unlock()
         hook("post_" + kind, "photos")
-        assert_still(box, task, stick)
+        assert_stopped(box, task, stick)
         assert os.listdir(share.path) == ["img0000"]
         assert run(box, task) == "successful"
         same(stick, share.path)
@@ -218,7 +223,7 @@ def test_a_share_is_locked_during_a_run(box):
     """The run is cancelled, the share can be unmounted at once, and the task cannot run. Unlocked,
     the task is there again without a plug-in; nothing starts it."""
     share, stick, task = start(box, files=150, size=1 << 20, device_mb=300)
-    begin(box, task, share, stick)
+    begin(box, task, share)
     hook("pre_encrypt", "photos")
     share.lock()
     answer = box.task(task)
@@ -247,7 +252,7 @@ def test_a_share_is_deleted_during_a_run(box):
                                schedule_json_str=DAILY)
     with open(CRON_FILE, encoding="utf-8") as cron:
         assert f"--execute-task {task}\n" in cron.read()
-    begin(box, task, share, stick)
+    begin(box, task, share)
     hook("pre_delete", "photos")
     assert box.ask("list_task")["task_list"] == []
     assert os.listdir("/volume1/@Ferrix/task") == []
