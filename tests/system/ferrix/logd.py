@@ -52,6 +52,7 @@ class LogDaemon:
         self.lines = []
         self._path = path
         self._lock = threading.Lock()
+        self._raw = []  # arrived, and not yet taken apart
         self._rest = b""
         heard, ready = os.pipe()
         if os.fork() == 0:
@@ -66,19 +67,22 @@ class LogDaemon:
 
     def _load(self):
         """Takes in what has arrived; the caller has the lock."""
-        *lines, self._rest = (self._rest + self._kept.read()).split(b"\0")
-        for data in lines:
-            match = LINE.match(data)
-            self.lines.append(os.fsdecode(match[3] if match else data).rstrip("\n"))
+        *raw, self._rest = (self._rest + self._kept.read()).split(b"\0")
+        self._raw += raw
 
     def mark(self):
+        """The number of lines so far; quick, as a run goes on meanwhile."""
         with self._lock:
             self._load()
-            return len(self.lines)
+            return len(self.lines) + len(self._raw)
 
     def since(self, mark=0):
         with self._lock:
             self._load()
+            for data in self._raw:
+                match = LINE.match(data)
+                self.lines.append(os.fsdecode(match[3] if match else data).rstrip("\n"))
+            self._raw.clear()
             return self.lines[mark:]
 
     def expect(self, part, mark=0, timeout=20):

@@ -133,7 +133,7 @@ def test_a_share_is_renamed_during_a_run(box):
     class Photos:
         path = "/volume1/photos"
 
-    begin(box, task, Photos, stick)
+    begin(box, task, Photos)
     ctl.ok("share", "rename", "photos", "pictures")
     assert len(os.listdir("/volume1/pictures")) < 150
     no_half_files(stick, "/volume1/pictures")
@@ -150,7 +150,7 @@ def test_a_refused_rename_disturbs_no_run(box):
     class Photos:
         path = "/volume1/photos"
 
-    begin(box, task, Photos, stick)
+    begin(box, task, Photos)
     assert "already" in ctl.refused("share", "rename", "photos", "music")
     assert "nothing is ever replaced" in ctl.refused("share", "rename", "photos", "private")
     wait_until(lambda: box.status(task) not in ("waiting", "copying"), 120)
