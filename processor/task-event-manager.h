@@ -25,9 +25,9 @@ public:
 
     // Queues a task; warns and changes nothing when it is queued or running.
     void PushEvent(uint64_t task_id);
-    // Takes the first task off the queue into the processing set: 1 with the id, 0 without. `on_pull`
-    // is called with the id under the lock, so that whoever finds the task in the queue no more sees
-    // what it did; it may take leaf locks only.
+    // Takes the first task off the queue into the processing set: 1 with the id, 0 without.
+    // `on_pull` is called with the id under the lock, so that whoever finds the task in the queue
+    // no more sees what it did; it may take leaf locks only.
     [[nodiscard]] int PullEvent(uint64_t& task_id, void (*on_pull)(uint64_t task_id) = nullptr);
     // Puts a running task back, behind all others.
     void RedoEvent(uint64_t task_id);

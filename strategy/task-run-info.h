@@ -2,9 +2,9 @@
 //
 // Built when the entries of a device are loaded and kept in TaskEntryHandler, which hands out full
 // copies. The counted references are owned jointly by all copies: an object lives as long as the
-// last copy, also when the entry has gone. After loading only the registry's own copy changes: a run
-// sets `status` and `version_dir`, a command the settings with the destination. A copy belongs to one
-// thread; the objects behind the references are safe for any.
+// last copy, also when the entry has gone. After loading only the registry's own copy changes: a
+// run sets `status` and `version_dir`, a command the settings with the destination. A copy belongs
+// to one thread; the objects behind the references are safe for any.
 #pragma once
 
 #include <cstdint>

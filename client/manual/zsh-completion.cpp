@@ -39,7 +39,7 @@ else
 fi
 )zsh";
 
-// A text within a specification of an option or argument.
+// A text within what zsh is told of an option or argument.
 std::string SpecText(std::string text) {
     text = Replaced(std::move(text), "\\", "\\\\");
     for (const char* mark : {"[", "]", ":"}) text = Replaced(text, mark, std::string("\\") + mark);

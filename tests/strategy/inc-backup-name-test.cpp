@@ -103,7 +103,7 @@ TEST_F(IncBackupNameTest, AZoneThatIsChangedBetweenRunsIsTakenUp) {
     WriteSrc("/1.jpg", "bytes", 1704065400);  // half an hour before the year ends in London
     RunWell();
     EXPECT_EQ("/2023-12-31/1.jpg", Recorded("/1.jpg"));
-    setenv("TZ", "XXX-9", 1);  // and nobody tells the C library
+    setenv("TZ", "JST-9", 1);  // and nobody tells the C library
     WriteSrc("/2.jpg", "bytes", 1704065400);
     RunWell();
     EXPECT_EQ("/2024-01-01/2.jpg", Recorded("/2.jpg"));
