@@ -42,11 +42,7 @@ Ferrixd::Ferrixd() {
     InitDeviceSupport();
 }
 
-// Threads that still run are left alone with all they use: a condition variable with a waiter must
-// not be destroyed, and neither must a worker at work. The process ends right after this.
 Ferrixd::~Ferrixd() {
-    if (m_processor_count != 0) static_cast<void>(m_processors.release());
-    if (m_has_app_thread) return;
     pthread_cond_destroy(&m_queue_cond);
     pthread_mutex_destroy(&m_queue_mutex);
 }

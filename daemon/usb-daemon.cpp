@@ -34,8 +34,7 @@ int USBDaemon::Run() {
     LogOpen("ferrixd");
     m_app.StartAppThread();
     const int result = ServeUntilStopped(status);
-    // After a failure the application thread is not joined: the process ends with the return from
-    // main.
+    // After a failure the application thread is not joined: it ends with the process.
     if (result == 0) m_app.StopAppThread();
     unlink(m_pid_file.c_str());
     return result;

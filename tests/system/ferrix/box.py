@@ -91,7 +91,6 @@ class Box:
         self.devices, self.shares = [], {}
         self.extra_conf = ""
         self.daemon_pid = None
-        self.checks_leaks = True  # under the address sanitizer
         self.volume_loop = None
         self.log = LogDaemon() if log else None
         os.makedirs("/volume1", exist_ok=True)
@@ -157,9 +156,8 @@ class Box:
 
     def start(self, wrapper=(), wait=True):
         program = f"{PACKAGE}/target/sbin/ferrixd"
-        leaks = f"detect_leaks={int(self.checks_leaks)}"
         environment = dict(os.environ,
-                           ASAN_OPTIONS=f"log_path=/tmp/sanitizer:exitcode=99:{leaks}",
+                           ASAN_OPTIONS="log_path=/tmp/sanitizer:exitcode=99",
                            UBSAN_OPTIONS="log_path=/tmp/sanitizer:print_stacktrace=1",
                            TSAN_OPTIONS="log_path=/tmp/sanitizer:exitcode=99")
         subprocess.run([*wrapper, program], check=True, env=environment)
