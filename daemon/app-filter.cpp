@@ -10,6 +10,7 @@
 #include "daemon/task-folder.h"
 #include "filter/file-filter.h"
 #include "ipc/pobject.h"
+#include "platform/durable-file.h"
 #include "platform/json-util.h"
 #include "platform/utility.h"
 #include "processor/task-entry-handler.h"
@@ -28,7 +29,8 @@ constexpr char CUSTOM_EXTENSIONS[] = "user_defined_extensions";
 // Writable by its owner alone, whatever the umask.
 constexpr mode_t CONFIG_MODE = 0644;
 
-// All six are sent, and each is a list (nothing is an empty one).
+// All six are sent, and each is a list (nothing is an empty one): a slip of a client must not turn
+// a list that protects files into none.
 bool HasAllLists(const PObject& request) {
     for (const char* key : LIST_KEYS) {
         if (!request.HasMember(key)) return false;
@@ -50,16 +52,6 @@ PObject ToArray(const Texts& texts) {
     return array;
 }
 
-int WriteAll(int fd, std::string_view text) {
-    while (!text.empty()) {
-        const ssize_t written = write(fd, text.data(), text.size());
-        if (written < 0 && errno == EINTR) continue;
-        if (written < 0) return -1;
-        text.remove_prefix(static_cast<size_t>(written));
-    }
-    return 0;
-}
-
 int ReadAll(int fd, std::string& text) {
     char buffer[16384];
     for (;;) {
@@ -75,13 +67,9 @@ int SetUserConfig(const std::string& path, const PObject& names, const PObject& 
     Json::Value config(Json::objectValue);
     PObjectArrayToJson(names, CUSTOM_NAMES, config);
     PObjectArrayToJson(extensions, CUSTOM_EXTENSIONS, config);
-    UniqueFd file(
-        open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_NOFOLLOW | O_CLOEXEC, CONFIG_MODE));
-    if (!file.IsValid()) {
-        SLOG_ERR("Failed to open file '%s'\n", path.c_str());
-        return -1;
-    }
-    return WriteAll(file.Get(), WriteJson(config) + "\n") < 0 || file.Close() != 0 ? -1 : 0;
+    if (WriteDurableFile(path, WriteJson(config) + "\n", CONFIG_MODE) == 0) return 0;
+    SLOG_ERR("Failed to open file '%s'\n", path.c_str());
+    return -1;
 }
 
 int GetUserConfig(const std::string& path, PObject& names, PObject& extensions) {

@@ -1,16 +1,11 @@
 #include "filter/filter-file.h"
 
-#include <fcntl.h>
-#include <sys/stat.h>
-#include <unistd.h>
-
-#include <cerrno>
 #include <cstdarg>
 #include <cstdio>
 
 #include "filter/filter-parser.h"
 #include "filter/filter-schema.h"
-#include "utils/unique-fd.h"
+#include "platform/durable-file.h"
 
 namespace {
 
@@ -105,24 +100,10 @@ private:
     std::string m_text;
 };
 
-int WriteAll(int fd, std::string_view text) {
-    while (!text.empty()) {
-        const ssize_t done = write(fd, text.data(), text.size());
-        if (done < 0 && errno == EINTR) continue;
-        if (done < 0) return -1;
-        text.remove_prefix(static_cast<size_t>(done));
-    }
-    return 0;
-}
-
+// Writable by its owner alone. Half a list would let the next mirror remove what it protected, so
+// the file is replaced whole.
 int WriteFile(const std::string& path, const std::string& text) {
-    UniqueFd fd(open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0644));
-    if (!fd.IsValid()) return -1;
-    // Also a file that was left writable for all before; a failure leaves it as it was.
-    struct stat st {};
-    if (fstat(fd.Get(), &st) == 0 && S_ISREG(st.st_mode)) (void)fchmod(fd.Get(), 0644);
-    const int result = WriteAll(fd.Get(), text);
-    return fd.Close() == 0 ? result : -1;
+    return WriteDurableFile(path, text, 0644);
 }
 
 }  // namespace

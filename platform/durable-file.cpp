@@ -1,6 +1,7 @@
 #include "platform/durable-file.h"
 
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -11,15 +12,24 @@
 
 namespace {
 
-bool IsWritten(const std::string& path, const std::string& content) {
-    UniqueFd file(open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC | O_NOFOLLOW, 0600));
-    if (!file.IsValid()) return false;
-    for (size_t done = 0; done < content.size();) {
-        const ssize_t length = write(file.Get(), content.data() + done, content.size() - done);
+bool IsWritten(const std::string& path, std::string_view content, mode_t mode) {
+    UniqueFd file(open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC | O_NOFOLLOW, mode));
+    if (!file.IsValid() || fchmod(file.Get(), mode) != 0) return false;
+    while (!content.empty()) {
+        const ssize_t length = write(file.Get(), content.data(), content.size());
+        if (length < 0 && errno == EINTR) continue;
         if (length < 0) return false;
-        done += static_cast<size_t>(length);
+        content.remove_prefix(static_cast<size_t>(length));
     }
     return fsync(file.Get()) == 0 && file.Close() == 0;
+}
+
+bool IsReplaceable(const std::string& path) {
+    struct stat there {};
+    if (lstat(path.c_str(), &there) != 0) return errno == ENOENT;
+    if (S_ISREG(there.st_mode) || S_ISLNK(there.st_mode)) return true;
+    errno = S_ISDIR(there.st_mode) ? EISDIR : EINVAL;
+    return false;
 }
 
 bool IsFolderSynced(const std::string& folder) {
@@ -42,11 +52,16 @@ int ReadDurableFile(const std::string& path, std::string& content) {
     }
 }
 
-int WriteDurableFile(const std::string& path, const std::string& content) {
+int WriteDurableFile(const std::string& path, std::string_view content, mode_t mode) {
+    if (!IsReplaceable(path)) return -1;
     const std::string fresh = path + ".new";
-    const bool is_written = IsWritten(fresh, content) && rename(fresh.c_str(), path.c_str()) == 0 &&
-                            IsFolderSynced(PathDirName(path));
-    return is_written ? 0 : -1;
+    if (!IsWritten(fresh, content, mode) || rename(fresh.c_str(), path.c_str()) != 0) {
+        const int error = errno;
+        unlink(fresh.c_str());  // on a full disk, of all places
+        errno = error;
+        return -1;
+    }
+    return IsFolderSynced(PathDirName(path)) ? 0 : -1;
 }
 
 int RemoveDurableFile(const std::string& path) {

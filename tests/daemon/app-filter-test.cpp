@@ -213,12 +213,33 @@ TEST_F(FilterSettingTest, AnUnknownTaskHasNoFolderToWriteTo) {
     EXPECT_TRUE(m_log.Has("[ERR] Invalid parameter"));
 }
 
-TEST_F(FilterSettingTest, APlantedLinkIsNotWrittenThrough) {
+TEST_F(FilterSettingTest, APlantedLinkIsReplacedAndNotWrittenThrough) {
     const std::string target = m_dir.Write("elsewhere", "precious");
-    ASSERT_EQ(0, unlink(File("user.config").c_str()));
-    ASSERT_EQ(0, symlink(target.c_str(), File("user.config").c_str()));
-    EXPECT_THAT(Set(Setting()), IsError(11, "Failed to WriteFilterSetting"));
+    for (const char* name : {"user.config", "blacklist.filter", "whitelist.filter"}) {
+        ASSERT_EQ(0, unlink(File(name).c_str()));
+        ASSERT_EQ(0, symlink(target.c_str(), File(name).c_str()));
+    }
+    EXPECT_EQ("null", Set(Setting()).ToText());
     EXPECT_EQ("precious", ReadWholeFile(target));
+}
+
+// Half a black list would let the next mirror remove what the whole one protected.
+TEST_F(FilterSettingTest, AFileThatCannotBeWrittenKeepsItsOldList) {
+    const PObject full = Setting({
+        {"custom_name", {"mine"}},
+        {"black_name",  {"keep"}},
+        {"white_name",  {"only"}}
+    });
+    const std::vector<std::string> files = {"user.config", "blacklist.filter", "whitelist.filter"};
+    for (size_t failing = 0; failing < files.size(); ++failing) {
+        ASSERT_EQ("null", Set(full).ToText());
+        const std::string before = AllFiles()[failing];
+        const std::string in_the_way = File(files[failing]) + ".new";
+        ASSERT_EQ(0, mkdir(in_the_way.c_str(), 0755));
+        EXPECT_THAT(Set(Setting()), IsError(11, "Failed to WriteFilterSetting")) << files[failing];
+        ASSERT_EQ(0, rmdir(in_the_way.c_str()));
+        EXPECT_EQ(before, AllFiles()[failing]) << files[failing];
+    }
 }
 
 TEST_F(FilterSettingTest, AnEntryWithoutAFilterIsAnError) {

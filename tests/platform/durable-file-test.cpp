@@ -1,6 +1,7 @@
 #include "platform/durable-file.h"
 
 #include <gtest/gtest.h>
+#include <sys/mount.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -56,6 +57,30 @@ TEST_F(DurableFileTest, AFailedWriteLeavesTheOldContent) {
     EXPECT_EQ(ENOENT, errno);
 }
 
+TEST_F(DurableFileTest, AFullDiskLeavesTheOldContentAndNothingElse) {
+    if (geteuid() != 0) GTEST_SKIP() << "only root may mount";
+    const std::string disk = m_dir.MakeDir("disk");
+    ASSERT_EQ(0, mount("tmpfs", disk.c_str(), "tmpfs", 0, "size=64k"));
+    ASSERT_EQ(0, WriteDurableFile(disk + "/record", "old"));
+    EXPECT_EQ(-1, WriteDurableFile(disk + "/record", std::string(1 << 20, 'x')));
+    EXPECT_EQ(ENOSPC, errno);
+    EXPECT_EQ("old", ReadWholeFile(disk + "/record"));
+    EXPECT_NE(0, access((disk + "/record.new").c_str(), F_OK));
+    EXPECT_EQ(0, umount(disk.c_str()));
+}
+
+TEST_F(DurableFileTest, WhatIsNoFileIsRefused) {
+    ASSERT_EQ(0, mkfifo(m_path.c_str(), 0600));
+    EXPECT_EQ(-1, WriteDurableFile(m_path, "new"));
+    EXPECT_EQ(EINVAL, errno);
+    struct stat info {};
+    ASSERT_EQ(0, stat(m_path.c_str(), &info));
+    EXPECT_TRUE(S_ISFIFO(info.st_mode));
+    m_dir.MakeDir("folder");
+    EXPECT_EQ(-1, WriteDurableFile(m_dir / "folder", "new"));
+    EXPECT_EQ(EISDIR, errno);
+}
+
 TEST_F(DurableFileTest, ARemovedFileIsGone) {
     ASSERT_EQ(0, WriteDurableFile(m_path, "x"));
     EXPECT_EQ(0, RemoveDurableFile(m_path));
@@ -71,11 +96,16 @@ TEST_F(DurableFileTest, WhatCannotBeRemovedIsAFailure) {
     EXPECT_EQ(ENOENT, errno);
 }
 
-TEST_F(DurableFileTest, TheFileIsItsOwnersAlone) {
+TEST_F(DurableFileTest, TheFileIsItsOwnersAloneUnlessAskedOtherwise) {
     ASSERT_EQ(0, WriteDurableFile(m_path, "x"));
     struct stat info {};
     ASSERT_EQ(0, stat(m_path.c_str(), &info));
     EXPECT_EQ(0600U, info.st_mode & 07777);
+    const mode_t mask = umask(0077);
+    ASSERT_EQ(0, WriteDurableFile(m_path, "x", 0644));
+    umask(mask);
+    ASSERT_EQ(0, stat(m_path.c_str(), &info));
+    EXPECT_EQ(0644U, info.st_mode & 07777) << "as asked, whatever the umask";
 }
 
 }  // namespace
