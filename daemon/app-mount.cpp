@@ -113,6 +113,7 @@ int Ferrixd::LoadUSBTaskEntryByUSBID(uint64_t usb_id, const std::string& usb_sha
         SLOG_ERR("Failed to list task info for usb '%llu'\n", Llu(usb_id));
         return -1;
     }
+    DropUnusedUSBEntry(usb_id, usb_share_path);
     for (const TaskInfo& task : tasks) {
         if (AddUSBEntry(usb_info, usb_share_path) == 0) AddTaskEntry(task, usb_share_path);
     }
@@ -142,7 +143,7 @@ int Ferrixd::HandleVolumeMount(const PObject& request) {
         SLOG_WARN("NO matched usb info for '%s'\n", device.c_str());
         return -1;
     }
-    DropStaleEntries(usb_info.id, usb_share_path);
+    DropStaleEntries(usb_info.id);
     if (LoadUSBTaskEntryByUSBID(usb_info.id, usb_share_path) < 0) {
         SLOG_ERR("Failed to load usb and task entry for '%llu', '%s', ignore\n", Llu(usb_info.id),
                  usb_share_path.c_str());
@@ -168,18 +169,24 @@ void Ferrixd::EnqueueRunnableTasks(uint64_t usb_id) {
 }
 
 // A device that was pulled out is not announced. When it comes back its old entries would stand for
-// the device that has gone, and no task of them could run. The entry of a device whose tasks could
-// not be loaded outlives its unmounting and is worth nothing on another path.
-void Ferrixd::DropStaleEntries(uint64_t usb_id, const std::string& usb_share_path) {
+// the device that has gone, and no task of them could run.
+void Ferrixd::DropStaleEntries(uint64_t usb_id) {
+    std::list<TaskRunInfo> tasks;
+    TaskEntryHandler::GetInstance().ListTaskEntriesByUSB(usb_id, tasks);
+    if (!IsAnyGone(tasks)) return;
+    SLOG_NOTICE("The device of usb id '%llu' has been replaced, its entries are loaded anew\n",
+                Llu(usb_id));
+    DropTaskEntries(usb_id);
+}
+
+// The entry of a device whose tasks could not be loaded outlives its unmounting and is worth
+// nothing on another path.
+void Ferrixd::DropUnusedUSBEntry(uint64_t usb_id, const std::string& usb_share_path) {
     USBRunInfo usb;
     if (TaskEntryHandler::GetInstance().GetUSBEntry(usb_id, usb) < 0) return;
     std::list<TaskRunInfo> tasks;
     TaskEntryHandler::GetInstance().ListTaskEntriesByUSB(usb_id, tasks);
     if (tasks.empty() && usb.usb_share_path != usb_share_path) RemoveUSB(usb_id);
-    if (!IsAnyGone(tasks)) return;
-    SLOG_NOTICE("The device of usb id '%llu' has been replaced, its entries are loaded anew\n",
-                Llu(usb_id));
-    DropTaskEntries(usb_id);
 }
 
 void Ferrixd::DropTaskEntries(uint64_t usb_id) {

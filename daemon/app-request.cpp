@@ -41,6 +41,7 @@ bool Ferrixd::FindUSB(uint64_t usb_id, USBInfo& usb_info, PObject& response) {
 
 bool Ferrixd::LogTask(const TaskInfo& task_info, LogDescription::ID id, PObject& response) {
     if (AddTaskLog(task_info.id, id, task_info.task_name) == 0) return true;
+    SLOG_ERR("Failed to add log info to log db for '%llu'\n", Llu(task_info.id));
     SetResponseError(RESPONSE_DATABASE, "Failed to add log info to log db", response);
     return false;
 }

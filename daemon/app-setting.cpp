@@ -60,6 +60,7 @@ int Ferrixd::SetTask(const PObject& request, uint64_t task_id, PObject& response
     }
     const bool is_renamed = task_info.task_name != old_info.task_name;
     if (is_renamed && AddRenameLog(task_id, old_info.task_name, task_info.task_name) < 0) {
+        SLOG_ERR("Failed to add log info to log db for '%llu'\n", Llu(task_id));
         SetResponseError(RESPONSE_DATABASE, "Failed to add log info to log db", response);
     }
     if (TaskDB::GetInstance().UpdateTaskInfo(task_info) < 0) {

@@ -47,15 +47,14 @@ const char* IdleStatus(const TaskInfo& task) {
     return task.last_copied_time == 0 ? "initial" : "successful";
 }
 
-const char* TaskStatus(const TaskInfo& task, const Mounts& mounts) {
+// `run_state` is null for a task that is not loaded.
+const char* TaskStatus(const TaskInfo& task, const Mounts& mounts, const int* run_state) {
     if (!IsValidID(task.id)) return "na";
     if (!task.is_enable) return "disabled";
-    TaskRunInfo entry;
-    if (!mounts.is_usb_mounted || !mounts.is_hub_mounted ||
-        TaskEntryHandler::GetInstance().GetTaskEntry(task.id, entry) < 0) {
+    if (!mounts.is_usb_mounted || !mounts.is_hub_mounted || run_state == nullptr) {
         return task.error != 0 ? "failed" : "unmounted";
     }
-    switch (entry.status) {
+    switch (*run_state) {
         case TASK_RUN_STATE_RUNNING:
             return "copying";
         case TASK_RUN_STATE_CANCELING:
@@ -102,15 +101,10 @@ void SetPaths(const TaskInfo& task, PObject& response) {
     response["destination_path"] = destination;
 }
 
-// A run may have ended since the row was read. Its result is in the row before its state is idle.
+// A run may have ended since the row was read.
 TaskInfo WithLatestResult(const TaskInfo& listed) {
-    TaskRunInfo entry;
     TaskInfo latest;
-    if (TaskEntryHandler::GetInstance().GetTaskEntry(listed.id, entry) < 0 ||
-        entry.status != TASK_RUN_STATE_IDLE ||
-        TaskDB::GetInstance().GetTaskInfo(listed.id, latest) != 1) {
-        return listed;
-    }
+    if (TaskDB::GetInstance().GetTaskInfo(listed.id, latest) != 1) return listed;
     TaskInfo task = listed;
     task.error = latest.error;
     task.last_copied_time = latest.last_copied_time;
@@ -129,11 +123,15 @@ std::string CopyFilePath(uint64_t task_id, const FileProcessor* file_processor) 
 
 int Ferrixd::GetTaskResponse(const TaskInfo& listed, FileProcessor* file_processor,
                              PObject& response) {
-    const TaskInfo task_info = WithLatestResult(listed);
     USBInfo usb_info;
-    if (!FindUSB(task_info.usb_id, usb_info, response)) return -1;
-    const Mounts mounts = GetMounts(task_info.id);
-    const std::string status = TaskStatus(task_info, mounts);
+    if (!FindUSB(listed.usb_id, usb_info, response)) return -1;
+    const Mounts mounts = GetMounts(listed.id);
+    TaskRunInfo entry;
+    const bool is_loaded = TaskEntryHandler::GetInstance().GetTaskEntry(listed.id, entry) == 0;
+    // A run leaves its result in the row before it ejects the device, and both before its state is
+    // idle: a row that is read after these is of no earlier run.
+    const TaskInfo task_info = is_loaded ? WithLatestResult(listed) : listed;
+    const std::string status = TaskStatus(task_info, mounts, is_loaded ? &entry.status : nullptr);
     SetSettings(task_info, response);
     SetDevice(usb_info, response);
     SetPaths(task_info, response);

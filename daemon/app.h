@@ -174,8 +174,9 @@ private:
     void DropTaskEntry(uint64_t usb_id, uint64_t task_id);
     // Pauses the processors and drops every task entry of the device.
     void DropTaskEntries(uint64_t usb_id);
-    // Before a device is loaded: drops what is left of it from another time.
-    void DropStaleEntries(uint64_t usb_id, const std::string& usb_share_path);
+    // Before a device is loaded: drop what is left of it from another time.
+    void DropStaleEntries(uint64_t usb_id);
+    void DropUnusedUSBEntry(uint64_t usb_id, const std::string& usb_share_path);
     void EnqueueRunnableTasks(uint64_t usb_id);
     void EnqueueTask(uint64_t task_id);
     void RemoveUSB(uint64_t usb_id);

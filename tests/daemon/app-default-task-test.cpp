@@ -59,6 +59,14 @@ TEST_F(DefaultTaskTest, EnablingTakesEffectOnADeviceThatIsPluggedInAlready) {
     EXPECT_TRUE(m_log.Has("[INFO] Enable Task '1'"));
 }
 
+TEST_F(DefaultTaskTest, OfTwoCandidatesTheOneWhoseUuidSortsFirstIsTaken) {
+    const uint64_t task_id = Default(false);
+    PlugInFront("z");
+    PlugInFront("a");
+    ASSERT_THAT(Enable(task_id), IsSuccess());
+    EXPECT_EQ(MountPath("a"), Entry(task_id).src_dir_path);
+}
+
 TEST_F(DefaultTaskTest, WithNoDeviceThereTheTaskIsEnabledAndWaits) {
     const uint64_t task_id = Default(false);
     EXPECT_EQ("null", Enable(task_id).ToText());

@@ -1,5 +1,4 @@
 // The road of a message to its handler, and the application thread.
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include "shell-fixture.h"
@@ -162,25 +161,6 @@ TEST_F(MessageTest, AfterAClientsStopTheLastItemStaysUnread) {
 
 TEST_F(MessageTest, WithoutAThreadAMessageIsNotWaitedFor) {
     EXPECT_TRUE(Process(Action("list_task")).IsNull());
-}
-
-// As after a failed "link": the process ends while the thread still waits for messages.
-TEST_F(MessageTest, TheObjectCanGoWhileItsThreadWaits) {
-    const pid_t child = fork();
-    if (child == 0) {
-        alarm(60);
-        {
-            Ferrixd app;
-            if (app.StartAppThread() != 0) _exit(1);
-            PObject response;
-            app.ProcessMessage(Action("no_such_thing"), response);
-            if (response["ack"].AsString() != "ok") _exit(2);
-        }
-        _exit(0);
-    }
-    int status = -1;
-    ASSERT_EQ(child, waitpid(child, &status, 0));
-    EXPECT_EQ(0, status);
 }
 
 }  // namespace

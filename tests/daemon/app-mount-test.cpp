@@ -387,4 +387,17 @@ TEST_F(MountTest, ADeviceWithoutTaskEntriesKeepsItsOwnEntry) {
         m_log.Has("[INFO] No matched task entry for usb share path '" + MountPath("a") + "'"));
 }
 
+TEST_F(MountTest, AnEntryLeftFromAnotherPathIsNotUsedWhenEntriesAreLoaded) {
+    PlugIn("a", "u-1");
+    const uint64_t task_id = AddTask("a", "u-1");
+    TaskEntryHandler::GetInstance().RemoveTaskEntry(task_id);
+    EXPECT_EQ(0, PreUnmount("a"));
+    m_fake.Unmount(MountPath("a"));
+    PlugIn("b", "u-1");
+    EXPECT_EQ(0, LoadEntries());
+    ASSERT_THAT(LoadedDevices(), SizeIs(1));
+    EXPECT_EQ(MountPath("b"), LoadedDevices().front().usb_share_path);
+    EXPECT_EQ(MountPath("b"), Entry(task_id).src_dir_path);
+}
+
 }  // namespace

@@ -243,6 +243,7 @@ TEST_F(SettingTest, ALogRowThatCannotBeAddedDoesNotStopTheRename) {
                     {"task_name", "New"}
     })),
                 IsError(2, "Failed to add log info to log db"));
+    EXPECT_TRUE(m_log.Has("[ERR] Failed to add log info to log db for '1'"));
     EXPECT_EQ("New", Task(m_task_id).task_name);
     EXPECT_EQ("New", Entry(m_task_id).task_name);
     EXPECT_EQ("New", m_fake.SchedEntries().begin()->second.name);

@@ -292,6 +292,7 @@ TEST_F(AddTaskTest, ARowThatCannotBeUpdatedLeavesTheSchedule) {
 TEST_F(AddTaskTest, ALogRowThatCannotBeWrittenFailsAlthoughTheTaskExists) {
     BreakTable("log_info_table", "INSERT");
     EXPECT_THAT(Add(), IsError(2, "Failed to add log info to log db"));
+    EXPECT_TRUE(m_log.Has("[ERR] Failed to add log info to log db for '1'"));
     EXPECT_TRUE(IsLoaded(1));
     EXPECT_NE(-1, Task(1).schedule_id);
 }

@@ -137,6 +137,38 @@ def test_an_unusable_repository_ends_the_start(box):
         assert bad.read(4) == b"this"
 
 
+def test_a_start_that_fails_late_ends_too(box):
+    """No place for the status, or for the socket: the daemon ends, says why and leaves no pid file."""
+    for path, message in ((f"{PACKAGE}/etc/status.lock", "SetServiceStatus() failed"),
+                          ("/tmp/ferrix-socket", "Failed to RecieveFromIPC.")):
+        if os.path.exists(path):
+            os.unlink(path)
+        os.makedirs(f"{path}/in-the-way")
+        mark = box.log.mark()
+        box.start(wait=False)
+        wait_until(lambda m=mark: box.log.has("Daemon End ...", m), 60)
+        assert os.wait()[1] == 0, "the daemon crashed at its end"
+        assert box.log.expect(message, mark)
+        assert not os.path.exists("/run/ferrixd.pid")
+        os.rmdir(f"{path}/in-the-way")
+        os.rmdir(path)
+    assert box.log.expect("failed to listen on port domain socket '/tmp/ferrix-socket'")
+
+
+def test_what_is_asked_without_an_answer_is_done(box):
+    """With "need_ack" false the connection closes without a word, when the work is done."""
+    box.add_share("photos")
+    stick = box.add_device("stick")
+    box.start()
+    stick.plug()
+    task_id = box.add_mirror(stick)
+    with wire.connect() as sock:
+        sock.sendall(wire.encode({"action": "remove_task", "task_id": task_id, "need_ack": False}))
+        assert sock.recv(1) == b""
+    assert not os.path.exists(f"/volume1/@Ferrix/task/{task_id}")
+    assert box.task(task_id) is None
+
+
 def test_a_log_daemon_that_hangs_does_not_hold_the_daemon_up(box):
     """With a log daemon that takes no more lines, commands are still answered."""
     box.start()
