@@ -19,7 +19,8 @@ int WaitReady(int descriptor, bool for_writing, const timeval& timeout) {
         return -1;
     }
     pollfd entry{descriptor, static_cast<short>(for_writing ? POLLOUT : POLLIN), 0};
-    const timespec limit{timeout.tv_sec, timeout.tv_usec * 1000};
+    // Where long has 32 bits, tv_usec may have more.
+    const timespec limit{timeout.tv_sec, static_cast<long>(timeout.tv_usec * 1000)};
     const int ready = ppoll(&entry, 1, &limit, nullptr);
     if (ready > 0 && (entry.revents & POLLNVAL) != 0) {
         errno = EBADF;

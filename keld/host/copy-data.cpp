@@ -151,15 +151,14 @@ int MoveAroundHoles(PieceMover& mover, int from, int to, off_t size) {
     return KELDERR_SUCCESS;
 }
 
-bool IsUnchanged(int from, const struct stat& before, int* code) {
+// KELDERR_SUCCESS if the source is what it was before it was read.
+int CheckUnchanged(int from, const struct stat& before) {
     struct stat now {};
-    if (fstat(from, &now) != 0) {
-        *code = CopySourceError(errno);
-        return false;
-    }
-    *code = KELDERR_FILE_OPERATION;
-    return now.st_size == before.st_size && now.st_mtim.tv_sec == before.st_mtim.tv_sec &&
-           now.st_mtim.tv_nsec == before.st_mtim.tv_nsec;
+    if (fstat(from, &now) != 0) return CopySourceError(errno);
+    const bool is_same = now.st_size == before.st_size &&
+                         now.st_mtim.tv_sec == before.st_mtim.tv_sec &&
+                         now.st_mtim.tv_nsec == before.st_mtim.tv_nsec;
+    return is_same ? KELDERR_SUCCESS : KELDERR_FILE_OPERATION;
 }
 
 }  // namespace
@@ -170,7 +169,7 @@ int CopyData(int from, int to, const struct stat& source, const CopyCancel& canc
     const bool is_small = size < SMALL_SIZE && !has_holes;
     if (is_small) {
         const ssize_t moved = MoveInOneGo(from, to, size);
-        if (moved == size) return KELDERR_SUCCESS;
+        if (moved == size) return CheckUnchanged(from, source);
         if (moved > size) return KELDERR_FILE_OPERATION;
     }
     if (is_small || ioctl(to, FICLONE, from) != 0) {
@@ -178,8 +177,7 @@ int CopyData(int from, int to, const struct stat& source, const CopyCancel& canc
         const int code = has_holes ? MoveAroundHoles(mover, from, to, size) : mover.Move(0, size);
         if (code != KELDERR_SUCCESS) return code;
     }
-    int code = KELDERR_SUCCESS;
-    return IsUnchanged(from, source, &code) ? KELDERR_SUCCESS : code;
+    return CheckUnchanged(from, source);
 }
 
 }  // namespace keld_host

@@ -1,6 +1,5 @@
 // The state of host.conf in force, and when it is read anew.
-#include <fcntl.h>
-#include <unistd.h>
+#include <sys/stat.h>
 
 #include <cerrno>
 #include <cstring>
@@ -10,14 +9,14 @@
 #include "host/host-cache.h"
 #include "host/host-conf.h"
 #include "host/host-paths.h"
+#include "host/replace-file.h"
 #include "utils/log.h"
-#include "utils/unique-fd.h"
 
 namespace keld_host {
 namespace {
 
 // 64 MiB: far beyond any real file; a mistake shall not fill the memory of a small box.
-constexpr off_t MAX_CONF_SIZE = off_t{64} << 20;
+constexpr size_t MAX_CONF_SIZE = size_t{64} << 20;
 
 struct Cache {
     std::mutex mutex;
@@ -41,28 +40,6 @@ std::shared_ptr<const HostConf> DefaultConf() {
     return conf;
 }
 
-// Reads the file and its stamp. Returns 0, or an errno: ENOENT when there is no file.
-int ReadConf(const std::string& path, std::string& text, FileStamp& stamp) {
-    // O_NONBLOCK: a FIFO by mistake must not hold us up.
-    const UniqueFd fd(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
-    if (!fd.IsValid()) return errno;
-    struct stat info {};
-    if (fstat(fd.Get(), &info) != 0) return errno;
-    stamp = FileStamp::Take(info);
-    if (!S_ISREG(info.st_mode)) return EINVAL;
-    if (info.st_size > MAX_CONF_SIZE) return EFBIG;
-    text.clear();
-    char buffer[16384];
-    for (;;) {
-        const ssize_t length = read(fd.Get(), buffer, sizeof(buffer));
-        if (length < 0 && errno == EINTR) continue;
-        if (length < 0) return errno;
-        if (length == 0) return 0;
-        text.append(buffer, static_cast<size_t>(length));
-        if (static_cast<off_t>(text.size()) > MAX_CONF_SIZE) return EFBIG;
-    }
-}
-
 void TakeText(Cache& cache, const std::string& path, std::string text) {
     if (cache.text == text) return;
     auto conf = std::make_shared<HostConf>();
@@ -79,9 +56,9 @@ void TakeText(Cache& cache, const std::string& path, std::string text) {
 void Refresh(Cache& cache) {
     const std::string& path = Paths().hostConf;
     std::string text;
-    FileStamp stamp;
-    const int error = ReadConf(path, text, stamp);
-    cache.stamp = stamp;
+    struct stat info {};
+    const int error = ReadFile(path, MAX_CONF_SIZE, text, info);
+    cache.stamp = info.st_mode != 0 ? FileStamp::Take(info) : FileStamp{};  // 0: none was found
     if (error == 0) {
         TakeText(cache, path, std::move(text));
     } else if (error == ENOENT || error == ENOTDIR) {

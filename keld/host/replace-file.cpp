@@ -59,13 +59,18 @@ int SetMode(int fd, unsigned mode) {
 }  // namespace
 
 int ReadFile(const std::string& path, size_t limit, std::string& content) {
+    struct stat info {};
+    return ReadFile(path, limit, content, info);
+}
+
+int ReadFile(const std::string& path, size_t limit, std::string& content, struct stat& info) {
     content.clear();
     // O_NONBLOCK: a FIFO under this name must not hold us up.
     const UniqueFd fd(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
     if (!fd.IsValid()) return errno;
-    struct stat info {};
     if (fstat(fd.Get(), &info) != 0) return errno;
     if (!S_ISREG(info.st_mode)) return EINVAL;
+    if (info.st_size > 0 && static_cast<uint64_t>(info.st_size) > limit) return EFBIG;
     char buffer[16384];
     for (;;) {
         const ssize_t length = read(fd.Get(), buffer, sizeof(buffer));

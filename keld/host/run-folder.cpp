@@ -16,7 +16,9 @@ namespace {
 
 // Whether others than root and ourselves may write there.
 bool IsOpenToOthers(const struct stat& info) {
-    return (info.st_mode & S_IWOTH) != 0 || (info.st_uid != 0 && info.st_uid != geteuid());
+    const bool is_other_group = info.st_gid != 0 && info.st_gid != getegid();
+    return (info.st_mode & S_IWOTH) != 0 || ((info.st_mode & S_IWGRP) != 0 && is_other_group) ||
+           (info.st_uid != 0 && info.st_uid != geteuid());
 }
 
 // The executable regular files of a folder, by name.

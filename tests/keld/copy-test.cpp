@@ -248,6 +248,20 @@ TEST_F(KeldCopyTest, ASourceThatChangesWhileItIsReadIsNotTaken) {
     }
 }
 
+TEST_F(KeldCopyTest, ASmallSourceThatIsRewrittenInPlaceIsNotTaken) {
+    const std::string path = MakeSource("f", TestBytes(40000));
+    const UniqueFd from(open(path.c_str(), O_RDONLY));
+    struct stat before {};
+    ASSERT_EQ(0, fstat(from.Get(), &before));
+    for (const bool is_rewritten : {false, true}) {
+        const UniqueFd to(open(Target("f").c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644));
+        ASSERT_EQ(0, lseek(from.Get(), 0, SEEK_SET));
+        if (is_rewritten) Rewrite(path);
+        EXPECT_EQ(is_rewritten ? KELDERR_FILE_OPERATION : KELDERR_SUCCESS,
+                  keld_host::CopyData(from.Get(), to.Get(), before, {}));
+    }
+}
+
 TEST_F(KeldCopyTest, ASourceThatIsRemovedWhileItIsReadIsTakenWhole) {
     const std::string from = MakeSource("f", TestBytes(20 * MIB));
     EXPECT_EQ(KELDERR_SUCCESS, CopyAsking(from, Target("f"), [&](int count) {

@@ -237,6 +237,21 @@ TEST_F(RunProgramTest, ProgramsThatOthersCouldHaveChangedAreNotRun) {
     EXPECT_EQ("own\n", Out());
 }
 
+TEST_F(RunProgramTest, ProgramsThatAGroupCouldHaveChangedAreNotRun) {
+    if (geteuid() != 0) GTEST_SKIP() << "only root gives files to other groups";
+    const LogCapture log;
+    Script("d/shared", "echo shared >> DIR/out", 0775);
+    Script("d/own", "echo own >> DIR/out", 0775);
+    ASSERT_EQ(0, chown((m_dir / "d/shared").c_str(), 0, 100));
+    EXPECT_EQ(0, RunFolder(m_dir / "d", Program{}));
+    EXPECT_EQ("own\n", Out());
+    EXPECT_TRUE(log.Contains("'shared' is not run"));
+    ASSERT_EQ(0, chown((m_dir / "d").c_str(), 0, 100));
+    ASSERT_EQ(0, chmod((m_dir / "d").c_str(), 0775));
+    EXPECT_EQ(1, RunFolder(m_dir / "d", Program{}));
+    EXPECT_EQ("own\n", Out());
+}
+
 TEST_F(RunProgramTest, ExecPassesItsArgumentsAndItsResult) {
     const std::string script = Script("s", "printf '%s|' \"$@\" > DIR/out; exit 5");
     EXPECT_EQ(5, KLIBCExec(script.c_str(), "eject", "sd b", nullptr));
