@@ -95,7 +95,9 @@ size_t SendAll(int fd, const iovec* lines, size_t count) {
         if ((errno != EAGAIN && errno != ENOBUFS) || waited) break;
         if (NowMs() < g_stalled_until.load()) break;
         pollfd entry{fd, POLLOUT, 0};
-        if (poll(&entry, 1, LOG_STALL_MS) <= 0) {
+        const int ready = poll(&entry, 1, LOG_STALL_MS);
+        if (ready < 0 && errno == EINTR) continue;
+        if (ready <= 0) {
             g_stalled_until = NowMs() + kStallPauseMs;
             waited = true;
         }
@@ -119,13 +121,16 @@ size_t Send(const iovec* lines, size_t count) {
     return fd < 0 ? sent : sent + SendAll(fd, lines + sent, count - sent);
 }
 
-void TellLost(unsigned lost) {
+// Each loss is told by one thread.
+void TellLost() {
+    const unsigned lost = g_lost.exchange(0);
+    if (lost == 0) return;
     char text[256];
     const size_t header = WriteLogHeader(text, LOG_WARNING);
     const int size = snprintf(text + header, sizeof(text) - header,
                               "[WARN] %s(%d): %u log lines were lost\n", __FILE__, __LINE__, lost);
     const iovec note{text, header + static_cast<size_t>(size)};
-    if (Send(&note, 1) == 1) g_lost -= lost;
+    if (Send(&note, 1) != 1) g_lost += lost;
 }
 
 }  // namespace
@@ -145,7 +150,10 @@ void LogConnectionClose() {
 }
 
 void LogConnectionSend(const iovec* lines, size_t count) {
-    const unsigned lost = g_lost.load(std::memory_order_relaxed);
-    if (lost != 0) TellLost(lost);
+    if (g_lost.load(std::memory_order_relaxed) != 0) TellLost();
     g_lost += static_cast<unsigned>(count - Send(lines, count));
+}
+
+void LogConnectionSendInCrash(const iovec* lines, size_t count) {
+    if (const int fd = g_fd.load(); fd >= 0) static_cast<void>(SendAll(fd, lines, count));
 }

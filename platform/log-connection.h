@@ -19,3 +19,6 @@ void SetLogSocketForTest(const char* path);
 // one that is behind does not catch up within LOG_STALL_MS; after such a stall lines go out only if
 // the log daemon takes them at once, for a few seconds. A line then tells how many were lost.
 void LogConnectionSend(const iovec* lines, size_t count);
+
+// The same for the handler of a crash signal: without taking a lock, and on an open connection only.
+void LogConnectionSendInCrash(const iovec* lines, size_t count);

@@ -54,5 +54,5 @@ void LogQueueFlush() {
 
 void LogQueueSendInCrash() {
     const size_t count = g_lines.count.exchange(0);
-    LogConnectionSend(g_lines.lines, count);
+    LogConnectionSendInCrash(g_lines.lines, count);
 }

@@ -29,7 +29,10 @@ void Deliver(int priority, char* data, size_t size) {
     LogConnectionSend(&line, 1);
 }
 
-void SendQueueInCrash(int /*signal*/) { LogQueueSendInCrash(); }
+void SendQueueInCrash(int number) {
+    LogQueueSendInCrash();
+    raise(number);  // by now it ends the process, also when it was sent from outside
+}
 
 // What is queued tells what led to the crash.
 void SendQueueOnCrash() {
@@ -38,7 +41,7 @@ void SendQueueOnCrash() {
         // A handler that is there, of a debugging tool for example, has its reasons.
         if (sigaction(number, nullptr, &action) != 0 || action.sa_handler != SIG_DFL) continue;
         action.sa_handler = SendQueueInCrash;
-        action.sa_flags = static_cast<int>(SA_RESETHAND);  // and what crashed, crashes again
+        action.sa_flags = static_cast<int>(SA_RESETHAND);
         sigaction(number, &action, nullptr);
     }
 }

@@ -176,4 +176,17 @@ TEST_F(LogSocketTest, ACrashSendsWhatIsKeptBack) {
     EXPECT_EQ("last words", NextText());
 }
 
+TEST_F(LogSocketTest, ACrashSignalFromOutsideEndsTheProcessToo) {
+    EXPECT_EXIT(
+        {
+            LogOpen("boxd");
+            const LogBatch batch;
+            SLOG_INFO("last words");
+            kill(getpid(), SIGSEGV);
+            for (;;) pause();
+        },
+        testing::KilledBySignal(SIGSEGV), "");
+    EXPECT_EQ("last words", NextText());
+}
+
 }  // namespace
