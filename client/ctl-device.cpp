@@ -10,12 +10,25 @@
 #include "client/table.h"
 #include "client/task-text.h"
 #include "client/text.h"
+#include "platform/sdk-share.h"
 
 namespace {
+
+// A default task has no device of its own: it is the task of the one that it is loaded for.
+bool IsLoadedFor(const PObject& task, const std::string& share_name) {
+    return task["is_default_task"].AsBool() && !share_name.empty() &&
+           task["usb_share_name"].StringView() == share_name;
+}
 
 const PObject* TaskOf(const PluggedDevice& device, const PObject::array_type& tasks) {
     for (const PObject& task : tasks) {
         if (!device.uuid.empty() && task["uuid"].StringView() == device.uuid) return &task;
+    }
+    std::string share_name;
+    std::string share_path;
+    if (SDK::GetShareNameByPath(device.mount_path, share_name, share_path) < 0) return nullptr;
+    for (const PObject& task : tasks) {
+        if (IsLoadedFor(task, share_name)) return &task;
     }
     return nullptr;
 }
@@ -34,9 +47,12 @@ void ListDevices(const Ctl& ctl, bool as_json) {
         entry["mountpoint"] = JsonText(device.mount_path);
         entry["device"] = JsonText(device.device_path);
         entry["uuid"] = JsonText(device.uuid);
-        entry["task_id"] = task == nullptr
-                               ? Json::Value()
-                               : Json::Value(static_cast<Json::UInt64>((*task)["id"].AsUInt64()));
+        // Without the daemon it is not known, which is not the same as none.
+        if (is_reachable) {
+            entry["task_id"] =
+                task == nullptr ? Json::Value()
+                                : Json::Value(static_cast<Json::UInt64>((*task)["id"].AsUInt64()));
+        }
         list.append(entry);
         table.Add({Printable(device.mount_path), Printable(device.device_path),
                    device.uuid.empty() ? "none" : Printable(device.uuid),
@@ -45,7 +61,7 @@ void ListDevices(const Ctl& ctl, bool as_json) {
     }
     if (as_json) return PrintJson(list);
     if (devices.empty()) {
-        std::cout << "No device is plugged in.\n";
+        std::cout << "No device is plugged in and mounted: mount it first.\n";
         return;
     }
     std::cout << table.Text(ctl.output);
@@ -58,9 +74,9 @@ void AddDeviceCommands(CLI::App& program, const Ctl& ctl) {
     CLI::App* group = AddCommandGroup(program, "device", "The devices that are plugged in.",
                                       "ferrixctl device list");
     const auto as_json = std::make_shared<bool>(false);
-    CLI::App* list =
-        AddCommand(*group, "list", "Lists what is plugged in, with its uuid and its task.",
-                   "ferrixctl device list");
+    CLI::App* list = AddCommand(*group, "list",
+                                "Lists what is plugged in and mounted, with its uuid and its task.",
+                                "ferrixctl device list");
     AddJsonOption(*list, *as_json);
     list->callback([as_json, &ctl] { ListDevices(ctl, *as_json); });
 }

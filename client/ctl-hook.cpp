@@ -22,7 +22,8 @@ void AddHookCommand(CLI::App& program, const Ctl& ctl) {
         ->add_option("--type", options->type, "The kind of hook; taken from the name if not given")
         ->check(CLI::IsMember(HOOK_TYPES));
     command->callback([options, &ctl] {
-        const std::string type = options->type.empty() ? HookType(options->name) : options->type;
-        ctl.daemon.SendHook(options->name, type, HookKeys(options->keys));
+        const std::string usual = HookType(options->name);
+        ctl.daemon.SendHook(options->name, options->type.empty() ? usual : options->type,
+                            HookKeys(options->keys));
     });
 }

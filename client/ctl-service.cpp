@@ -1,6 +1,8 @@
 #include <json/value.h>
 #include <signal.h>
+#include <unistd.h>
 
+#include <cerrno>
 #include <fstream>
 #include <iostream>
 
@@ -45,7 +47,8 @@ const char* StateText(int state) {
 pid_t DaemonPid() {
     pid_t pid = 0;
     std::ifstream(ServicePlaces().pid_file) >> pid;
-    return pid > 0 && kill(pid, 0) == 0 ? pid : 0;
+    // A process of another user's may be looked for, but not sent a signal.
+    return pid > 0 && (kill(pid, 0) == 0 || errno == EPERM) ? pid : 0;
 }
 
 // An installation lays out the package's programs; its settings have no place yet.
@@ -70,43 +73,58 @@ void Start() {
     const std::string volume = GetRepoVolPath();
     if (volume.empty()) {
         throw CommandError(EXIT_REFUSED,
-                           "no volume can hold the repository: none is mounted and writable");
+                           "no volume can hold the repository: none is mounted and writable; on a "
+                           "plain machine the folder /volume1 is one, and host.conf names others");
     }
     std::cout << (was_running ? "The service runs already" : "The service runs")
               << ", with the repository " << Printable(RepositoryPath(volume)) << ".\n";
 }
 
+// All zero when the service was never started.
+ServiceStatus ReadStatus() {
+    ServiceStatus status;
+    if (FSExists(StatusPath()) && GetServiceStatus(status) < 0) {
+        throw CommandError(EXIT_REFUSED, geteuid() == 0
+                                             ? "the state of the service cannot be read"
+                                             : "the state of the service is for root: run this as "
+                                               "root");
+    }
+    return status;
+}
+
 void Stop() {
-    if (DaemonPid() == 0) {
+    const bool runs = DaemonPid() != 0;
+    const int state = ReadStatus().state;
+    if (!runs && (state == 0 || state == SERVICE_STATE_STOPPED)) {
         std::cout << "The service does not run.\n";
         return;
     }
-    if (ServiceCtrl().StopService() < 0) {
+    if ((runs ? ServiceCtrl().StopService() : ServiceCtrl().SettleStop()) < 0) {
         throw CommandError(EXIT_REFUSED, "the service could not be stopped");
     }
-    std::cout << "The service has stopped.\n";
+    std::cout << (runs ? "The service has stopped.\n"
+                       : "The service had ended by itself; it counts as stopped now.\n");
 }
 
 void ShowStatus(bool as_json) {
-    ServiceStatus status;
-    const bool is_known = FSExists(StatusPath()) && GetServiceStatus(status) == 0;
+    const ServiceStatus status = ReadStatus();
     const pid_t pid = DaemonPid();
+    const bool has_crashed = status.state == SERVICE_STATE_RUNNING && pid == 0;
+    const std::string state =
+        has_crashed ? "not running, though it was not stopped" : StateText(status.state);
     const std::string volume = GetRepoVolPath();
     if (as_json) {
         Json::Value answer;
         answer["state"] = status.state;
-        answer["state_text"] = StateText(status.state);
+        answer["state_text"] = state;
         answer["error"] = JsonText(status.error);
         answer["pid"] = pid;
         answer["enabled"] = IsEnabled();
         answer["repo_vol_path"] = JsonText(volume);
         return PrintJson(answer);
     }
-    std::string state = StateText(is_known ? status.state : 0);
-    if (status.state == SERVICE_STATE_RUNNING && pid == 0) {
-        state = "not running, though it was not stopped: \"ferrixctl service start\" starts it";
-    }
-    std::cout << "State:       " << state << '\n';
+    std::cout << "State:       " << state
+              << (has_crashed ? ": \"ferrixctl service start\" starts it\n" : "\n");
     if (!status.error.empty()) std::cout << "Error:       " << Printable(status.error) << '\n';
     if (pid != 0) std::cout << "Process:     " << pid << '\n';
     std::cout << "Enabled:     " << (IsEnabled() ? "yes" : "no") << '\n'
@@ -119,8 +137,13 @@ void Move(const std::string& to) {
         throw CommandError(EXIT_USAGE, Printable(to) + " is no volume of this box");
     }
     if (!ServiceCtrl().MoveRepoVolume(GetRepoVolPath(), to)) {
-        throw CommandError(EXIT_REFUSED, "the repository was not moved; it is whole, on " +
-                                             Printable(GetRepoVolPath()));
+        const std::string volume = GetRepoVolPath();
+        throw CommandError(
+            EXIT_REFUSED,
+            volume == to ? "the repository is on " + Printable(to) +
+                               " now, but the service could not be started there; "
+                               "the system log says why"
+                         : "the repository was not moved; it is whole, on " + Printable(volume));
     }
     std::cout << "The repository is " << Printable(RepositoryPath(GetRepoVolPath())) << ".\n";
 }
@@ -192,14 +215,18 @@ void AddServiceCommands(CLI::App& program) {
     move->add_option("VOLUME", *to, "The other volume's root folder")->required();
     move->callback([to] { Move(PathWithoutTrailingSlashes(*to)); });
 
-    AddCommand(*group, "report",
-               "Prints a usage report as JSON: how many devices and tasks there are, and how they "
-               "are set. It holds no names of tasks, folders or shares.",
-               "ferrixctl service report")
-        ->callback([] {
-            if (PrintUsageReport() < 0) {
-                throw CommandError(EXIT_REFUSED, "there is nothing to report on");
-            }
-        });
+    CLI::App* report =
+        AddCommand(*group, "report",
+                   "Prints a usage report as JSON, with or without --json: how many devices and "
+                   "tasks there are, and how they are set. It holds no names of tasks, folders or "
+                   "shares.",
+                   "ferrixctl service report");
+    const auto is_asked_for = std::make_shared<bool>(false);
+    AddJsonOption(*report, *is_asked_for);
+    report->callback([is_asked_for] {
+        if (PrintUsageReport() < 0) {
+            throw CommandError(EXIT_REFUSED, "there is nothing to report on");
+        }
+    });
     AddRepositoryCommands(program);
 }

@@ -1,5 +1,6 @@
 #include <json/value.h>
 
+#include <algorithm>
 #include <iostream>
 
 #include "client/command.h"
@@ -9,13 +10,15 @@
 #include "client/filter-lists.h"
 #include "client/json-output.h"
 #include "client/plugged-device.h"
+#include "client/refusal.h"
+#include "client/share-folder-maker.h"
 #include "client/share-folder.h"
 #include "client/task-options.h"
 #include "client/text.h"
 #include "client/timetable.h"
 #include "db/task-info.h"
 #include "platform/task-utils.h"
-#include "utils/file-op.h"
+#include "utils/path-util.h"
 
 namespace {
 
@@ -44,29 +47,7 @@ int StrategyNumber(const std::string& text) {
     return COPY_STRATEGY_INCREMENTAL;
 }
 
-// An option that the strategy would pass over in silence is a misunderstanding.
-void CheckStrategy(const AddOptions& options) {
-    const bool sorts = options.task.uses_date_folders || options.task.renames ||
-                       options.task.keeps_folders || options.task.moves ||
-                       !options.task.conflict.empty();
-    if (sorts && options.strategy != "incremental") {
-        throw CommandError(
-            EXIT_USAGE,
-            "--date-folders, --rename, --keep-folders, --flat, --move and --conflict "
-            "are for --strategy incremental");
-    }
-    const bool rotates =
-        options.task.versions || options.task.keeps_all_versions || !options.task.rotation.empty();
-    if (rotates && options.strategy != "version") {
-        throw CommandError(EXIT_USAGE,
-                           "--versions, --all-versions and --rotation are for --strategy version");
-    }
-    if (!options.days.empty() && options.time.empty()) {
-        throw CommandError(EXIT_USAGE, "--days needs the time of the day: --at 02:30");
-    }
-}
-
-void SetFolders(const AddOptions& options, PObject& request) {
+void SetFolders(const AddOptions& options, const PluggedDevice& device, PObject& request) {
     const std::string& share_side = options.is_export ? options.from : options.to;
     const std::string& device_side = options.is_export ? options.to : options.from;
     if (share_side.empty()) {
@@ -77,14 +58,10 @@ void SetFolders(const AddOptions& options, PObject& request) {
     const ShareFolder folder = ParseShareFolder(share_side);
     request["hub_share_name"] = folder.share;
     request["hub_folder_path"] = folder.folder;
-    request["usb_folder_path"] = ParseDeviceFolder(device_side);
-    if (!options.makes_folder || options.is_export) return;
-    std::string path;
-    if (GetHubDirFullPath(folder.share, folder.folder, path) < 0 ||
-        FSMKDirP(path, FS_KEEP_UID, FS_KEEP_GID) < 0) {
-        throw CommandError(EXIT_REFUSED,
-                           "the folder \"" + Printable(share_side) + "\" could not be made");
-    }
+    const std::string device_folder = ParseDeviceFolder(device_side, device.mount_path);
+    // The destination of an export is made by its first run.
+    if (!options.is_export) CheckDeviceFolder(device.mount_path, device_folder);
+    request["usb_folder_path"] = device_folder;
 }
 
 // All that the daemon reads, with what is usual where nothing was said. What is usual loses
@@ -119,16 +96,54 @@ PObject MakeRequest(const AddOptions& options, const PluggedDevice& device) {
     return request;
 }
 
+// Whether there is no task, for sure, that copies into this folder of a share.
+bool IsUnused(const DaemonClient& daemon, const ShareFolder& folder) {
+    try {
+        const PObject::array_type tasks = daemon.Tasks();
+        return std::ranges::none_of(tasks, [&folder](const PObject& task) {
+            const ShareFolder used = SplitDisplayPath(task["destination_path"].AsString());
+            return used.share == folder.share && used.folder == folder.folder;
+        });
+    } catch (const CommandError&) {
+        return false;
+    }
+}
+
+// For a task that is refused for any other reason no folder is made, or it goes again.
+PObject AskWithFolder(const DaemonClient& daemon, const PObject& request) {
+    try {
+        return daemon.Ask("add_task", request);
+    } catch (const Refusal& refusal) {
+        if (refusal.Code() != REFUSED_NO_DESTINATION) throw;
+    }
+    const ShareFolder folder{request["hub_share_name"].AsString(),
+                             request["hub_folder_path"].AsString()};
+    ShareFolderMaker maker;
+    maker.Make(folder);
+    try {
+        return daemon.Ask("add_task", request);
+    } catch (const CommandError&) {
+        // Some refusals leave the task behind, and a daemon that fell silent may have added it.
+        if (IsUnused(daemon, folder)) maker.TakeBack();
+        throw;
+    }
+}
+
 void AddTask(const Ctl& ctl, const AddOptions& options) {
-    CheckStrategy(options);
+    CheckStrategy(options.task, StrategyNumber(options.strategy));
+    if (!options.days.empty() && options.time.empty()) {
+        throw CommandError(EXIT_USAGE, "--days needs the time of the day: --at 02:30");
+    }
     const PluggedDevice device = FindPluggedDevice(options.device);
     if (device.uuid.empty()) {
         throw CommandError(EXIT_REFUSED, "the device on " + Printable(device.mount_path) +
                                              " has no uuid to know it by: format it anew");
     }
     PObject request = MakeRequest(options, device);
-    SetFolders(options, request);
-    const uint64_t id = ctl.daemon.Ask("add_task", std::move(request))["task_id"].AsUInt64();
+    SetFolders(options, device, request);
+    const PObject added = options.makes_folder ? AskWithFolder(ctl.daemon, request)
+                                               : ctl.daemon.Ask("add_task", std::move(request));
+    const uint64_t id = added["task_id"].AsUInt64();
     if (options.as_json) {
         Json::Value answer;
         answer["task_id"] = static_cast<Json::UInt64>(id);
@@ -162,9 +177,13 @@ void AddTaskAddCommand(CLI::App& group, const Ctl& ctl) {
     command->add_option("--from", options->from,
                         "What is copied: a folder of the device, all of it if not given; with "
                         "--export SHARE/FOLDER");
-    command->add_flag("--export", options->is_export, "Copies from the share to the device");
-    command->add_flag("--make-folder", options->makes_folder,
-                      "Makes the folder of the share if it is missing");
+    CLI::Option* is_export =
+        command->add_flag("--export", options->is_export, "Copies from the share to the device");
+    command
+        ->add_flag("--make-folder", options->makes_folder,
+                   "Makes the folder of the share if it is missing; an export makes its folder of "
+                   "the device without it")
+        ->excludes(is_export);
     command
         ->add_option("--strategy", options->strategy,
                      "\"incremental\" copies what it has not copied yet; \"mirror\" makes the "

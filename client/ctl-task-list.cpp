@@ -7,12 +7,12 @@
 #include "client/ctl-task.h"
 #include "client/ctl.h"
 #include "client/json-output.h"
+#include "client/outcome-text.h"
 #include "client/table.h"
 #include "client/task-text.h"
 #include "client/text.h"
 #include "client/timetable.h"
 #include "db/task-info.h"
-#include "utils/error-code.h"
 
 namespace {
 
@@ -67,13 +67,13 @@ void ShowTask(const Ctl& ctl, const PObject& task, bool as_json) {
     };
     line("Task", TaskLabel(task));
     line("Status", ctl.output.Paint(status.colour, status.text) +
-                       (error == 0 ? "" : std::string(": ") + ErrorText(error)));
+                       (error == 0 ? "" : ": " + OutcomeText(error)));
     line("File in hand", Printable(task["copy_file_path"].StringView()));
     line("Kind", TaskTypeText(task["type"].AsInt32()));
     line("Strategy", StrategyText(task["copy_strategy"].AsInt32()));
     line("From", SourceText(task));
     line("To", DestinationText(task));
-    line("Device", Printable(task["producer"].AsString() + " " + task["product"].AsString()));
+    line("Device", DeviceText(task));
     line("Uuid", Printable(task["uuid"].StringView()));
     line("Plugged in", task["is_usb_mounted"].AsBool() ? "yes" : "no");
     line("Share", task["is_hub_mounted"].AsBool() ? "reachable" : "not reachable");

@@ -42,7 +42,11 @@ void CheckOptions(const TriggerOptions& options, const PObject& task) {
         throw CommandError(EXIT_USAGE, "--days needs the time of the day: --at 02:30");
     }
     if (!options.time.empty() && task["schedule_id"].AsInt64() == NO_SCHEDULE) {
-        throw CommandError(EXIT_REFUSED, "a task that comes with the box cannot have a timetable");
+        throw CommandError(EXIT_REFUSED,
+                           task["is_default_task"].AsBool()
+                               ? "a task that comes with the box cannot have a timetable"
+                               : "this task cannot have a timetable, as none could be made when it "
+                                 "was added: remove the task and add it again");
     }
 }
 

@@ -60,8 +60,11 @@ public:
         const size_t columns = m_terminal.Columns() - 1;
         for (const TaskLook& look : looks) {
             const Table::Cell status = StatusCell(look.task);
-            line(Shortened(TaskLabel(look.task), columns / 3) + "  " +
-                 m_terminal.Paint(status.colour, status.text) + "  " + ProgressText(look));
+            const std::string label = Shortened(TaskLabel(look.task), columns / 3);
+            // A line that wraps would be counted as one.
+            const size_t taken = DisplayWidth(label) + DisplayWidth(status.text) + 4;
+            line(label + "  " + m_terminal.Paint(status.colour, status.text) + "  " +
+                 Shortened(ProgressText(look), columns > taken ? columns - taken : 0));
             line("  " +
                  Shortened(Printable(look.task["copy_file_path"].StringView()), columns - 2));
         }
@@ -122,7 +125,7 @@ void Watch(const Ctl& ctl, const std::string& task, bool as_json) {
         if (task_id && watcher.Looks().empty()) {
             throw CommandError(EXIT_REFUSED, "the task has been removed");
         }
-        if (ctl.output.IsTerminal() && !as_json) {
+        if (ctl.output.CanRedraw() && !as_json) {
             screen.Show(watcher.Looks());
         } else {
             lines.Show(watcher.Looks());
@@ -132,7 +135,9 @@ void Watch(const Ctl& ctl, const std::string& task, bool as_json) {
         std::this_thread::sleep_for(LOOK_EVERY);
     }
     if (watcher.HasFailed()) {
-        throw CommandError(EXIT_REFUSED, "the run did not end well; \"ferrixctl log\" tells why");
+        throw CommandError(EXIT_REFUSED,
+                           "the run did not end well, or was cancelled before it began; "
+                           "\"ferrixctl log\" tells more");
     }
 }
 
@@ -149,7 +154,8 @@ void AddTaskWatchCommand(CLI::App& group, const Ctl& ctl) {
         "Follows a run: status, files and bytes done, rate, time, and the file in hand; on a "
         "terminal "
         "in place, else a line for each change. It waits for a run if none is under way, ends with "
-        "it, and ends with 0 only if it was successful. Without a task it follows whatever runs.",
+        "it, and ends with 0 only if it was successful. Without a task it follows whatever runs, "
+        "and ends with 0 only if all of that was.",
         "ferrixctl task watch Camera\n"
         "ferrixctl task watch --json | jq .files");
     command->add_option("TASK", options->task, "The task's id or name");

@@ -1,5 +1,7 @@
 #include "client/daemon-client.h"
 
+#include <unistd.h>
+
 #include "client/exit-status.h"
 #include "client/refusal.h"
 #include "client/text.h"
@@ -10,8 +12,12 @@ PObject DaemonClient::Send(const std::string& what, const PObject& request) cons
     PObject response;
     if (DaemonIPC(m_socket_path).SendCommand(request, response) == 0) return response;
     if (response.HasMember("error")) {
-        throw CommandError(EXIT_REFUSED, ExplainRefusal(what, response["error_code"].AsInt32(),
-                                                        Printable(response["error"].AsString())));
+        throw Refusal(what, response["error_code"].AsInt32(),
+                      Printable(response["error"].AsString()));
+    }
+    if (geteuid() != 0) {
+        throw CommandError(EXIT_NOT_REACHABLE, "the daemon does not answer at " + m_socket_path +
+                                                   ": it talks to root alone, so run this as root");
     }
     throw CommandError(EXIT_NOT_REACHABLE,
                        "the daemon does not answer at " + m_socket_path +

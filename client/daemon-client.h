@@ -1,7 +1,7 @@
 // Asks the daemon, and turns what can go wrong into the exit status and the sentence for the user.
 //
-// Threads: belongs to one thread. Errors: CommandError, EXIT_NOT_REACHABLE when nothing answers and
-// EXIT_REFUSED, with the daemon's own text, when it refuses.
+// Threads: belongs to one thread. Errors: CommandError, EXIT_NOT_REACHABLE when nothing answers,
+// and Refusal (client/refusal.h), with the daemon's own text, when it refuses.
 #pragma once
 
 #include <cstdint>

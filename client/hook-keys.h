@@ -8,7 +8,8 @@
 // The kinds that the daemon takes.
 inline const std::vector<std::string> HOOK_TYPES = {"volume_hook", "ferrix_hook", "share_hook"};
 
-// The kind that the box itself sends a hook under. EXIT_USAGE (CommandError) for an unknown name.
+// The kind that the box itself sends a hook under. EXIT_USAGE (CommandError) for an unknown name,
+// which the daemon would acknowledge.
 [[nodiscard]] std::string HookType(const std::string& name);
 
 // "KEY=VALUE" texts taken apart at the first "="; a value may be empty. EXIT_USAGE for a text

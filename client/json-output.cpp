@@ -1,11 +1,13 @@
 #include "client/json-output.h"
 
 #include <json/writer.h>
+#include <unicode/utf16.h>
 #include <unicode/utf8.h>
 
 #include <algorithm>
 #include <iostream>
 
+#include "client/text.h"
 #include "ipc/pobject.h"
 
 namespace {
@@ -17,11 +19,41 @@ constexpr std::string_view TRUTH_KEYS[] = {
     "is_usb_mounted",     "is_hub_mounted",        "is_task_runnable",
 };
 
+void AppendEscape(std::string& text, unsigned unit) {
+    constexpr char HEX[] = "0123456789abcdef";
+    text += {'\\', 'u', HEX[unit >> 12], HEX[unit >> 8 & 15], HEX[unit >> 4 & 15], HEX[unit & 15]};
+}
+
+// What a terminal would obey stands in strings only, where an escape means the same. The writer
+// itself escapes no more than the controls of ASCII.
+std::string WithEscapes(std::string_view json) {
+    constexpr UChar32 REPLACEMENT = 0xFFFD;
+    std::string text;
+    const int32_t length = static_cast<int32_t>(json.size());
+    for (int32_t at = 0; at < length;) {
+        const int32_t begin = at;
+        UChar32 c = 0;
+        U8_NEXT(json.data(), at, length, c);
+        const std::string_view character =
+            json.substr(static_cast<size_t>(begin), static_cast<size_t>(at - begin));
+        if (c < 0) c = REPLACEMENT;
+        if (c == '\n' || (c >= ' ' && c <= '~') || Printable(character) == character) {
+            text += character;
+        } else if (c <= 0xFFFF) {
+            AppendEscape(text, static_cast<unsigned>(c));
+        } else {
+            AppendEscape(text, static_cast<unsigned>(U16_LEAD(c)));
+            AppendEscape(text, static_cast<unsigned>(U16_TRAIL(c)));
+        }
+    }
+    return text;
+}
+
 std::string Write(const Json::Value& value, const char* indentation) {
     Json::StreamWriterBuilder builder;
     builder["indentation"] = indentation;
     builder["emitUTF8"] = true;
-    return Json::writeString(builder, value);
+    return WithEscapes(Json::writeString(builder, value));
 }
 
 }  // namespace

@@ -1,4 +1,5 @@
-// Answers as JSON, for scripts.
+// Answers as JSON, for scripts. What a terminal would obey (client/text.h) is written as an escape:
+// a reader gets the same text.
 #pragma once
 
 #include <json/value.h>

@@ -33,6 +33,7 @@ void Notify(const DaemonClient& daemon, const Options& options) {
         return;
     }
     if (options.hook.empty()) throw CLI::RequiredError("--execute-task or --hook");
+    (void)HookType(options.hook);  // a name that the daemon does not know it acknowledges as well
     daemon.SendHook(options.hook, options.type, HookKeys(options.keys));
 }
 

@@ -40,7 +40,7 @@ PluggedDevice FindPluggedDevice(const std::string& path) {
     if (path.empty() && devices.size() == 1) return devices.front();
     if (path.empty()) {
         throw CommandError(EXIT_USAGE, devices.empty()
-                                           ? "no device is plugged in"
+                                           ? "no device is plugged in and mounted"
                                            : "several devices are plugged in: say which with "
                                              "--device (\"ferrixctl device list\" shows them)");
     }

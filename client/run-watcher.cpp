@@ -1,6 +1,7 @@
 #include "client/run-watcher.h"
 
 #include <algorithm>
+#include <utility>
 
 namespace {
 
@@ -9,6 +10,13 @@ constexpr time_t RATE_SECONDS = 5;
 bool IsActive(const PObject& task) {
     const std::string_view status = task["task_status"].StringView();
     return status == "waiting" || status == "copying" || status == "canceling";
+}
+
+TaskLook LookAt(const PObject& task) {
+    TaskLook look;
+    look.task = task;
+    look.is_active = IsActive(task);
+    return look;
 }
 
 }  // namespace
@@ -25,21 +33,20 @@ uint64_t RunWatcher::Rate(uint64_t run, uint64_t bytes, time_t now) {
     return (bytes - first.bytes) / static_cast<uint64_t>(now - first.time);
 }
 
-TaskLook RunWatcher::LookAt(const PObject& task, const PObject& progress, time_t now) {
-    TaskLook look;
-    look.task = task;
-    look.is_active = IsActive(task);
-    // A task that only waits has the numbers of an earlier run of its own, if any.
-    look.has_progress = progress["run"].AsUInt64() != 0 &&
-                        progress["task_id"].AsUInt64() == task["id"].AsUInt64() &&
-                        task["task_status"].StringView() != "waiting";
-    if (!look.has_progress) return look;
+void RunWatcher::SetProgress(const PObject& progress, time_t now, TaskLook& look) {
+    look.has_progress = true;
     look.files = progress["files"].AsUInt64();
     look.bytes = progress["bytes"].AsUInt64();
     look.bytes_per_second = Rate(progress["run"].AsUInt64(), look.bytes, now);
     look.seconds = static_cast<uint64_t>(
         std::max<int64_t>(0, static_cast<int64_t>(now) - progress["start_time"].AsInt64()));
-    return look;
+}
+
+// A run that came to its end has left a result. Without one the task was taken out of the queue.
+bool RunWatcher::HasGoneWell(const PObject& task, const Known& known, bool has_run) {
+    const bool has_result =
+        known.is_copying || has_run || task["latest_finish_time"].AsUInt64() != known.finish_time;
+    return has_result && task["error_code"].AsInt32() == 0;
 }
 
 void RunWatcher::Update(const PObject::array_type& tasks, const PObject& progress, time_t now) {
@@ -47,24 +54,31 @@ void RunWatcher::Update(const PObject::array_type& tasks, const PObject& progres
     if (!m_first_run) m_first_run = run;
     m_looks.clear();
     m_is_any_active = false;
-    std::vector<uint64_t> active;
     for (const PObject& task : tasks) {
         const uint64_t id = task["id"].AsUInt64();
         if (m_task_id && *m_task_id != id) continue;
-        TaskLook look = LookAt(task, progress, now);
+        TaskLook look = LookAt(task);
+        const uint64_t finish_time = task["latest_finish_time"].AsUInt64();
+        Known& known = m_known.try_emplace(id, Known{finish_time, *m_first_run}).first->second;
+        const bool was_active = std::exchange(known.is_active, look.is_active);
         // A run may begin and end between two looks: the daemon's count tells.
-        const bool has_run = run != *m_first_run && progress["task_id"].AsUInt64() == id;
-        const bool was_active = std::find(m_active.begin(), m_active.end(), id) != m_active.end();
-        if (look.is_active) {
-            active.push_back(id);
-            m_is_any_active = true;
-        }
+        const bool is_latest = run != 0 && progress["task_id"].AsUInt64() == id;
+        const bool has_run = is_latest && run != known.run;
+        const bool has_ended = !look.is_active && (was_active || has_run);
         if (look.is_active || has_run) m_has_seen_run = true;
-        if (!look.is_active && (was_active || has_run)) {
-            m_has_failed = task["task_status"].StringView() != "successful";
+        if (look.is_active) {
+            m_is_any_active = true;
+            if (task["task_status"].StringView() != "waiting") known.is_copying = true;
         }
-        if (m_task_id || look.is_active || was_active || has_run)
-            m_looks.push_back(std::move(look));
+        // A task that waits, or has not run since, would show the numbers of an earlier run.
+        if (is_latest && (look.is_active ? task["task_status"].StringView() != "waiting"
+                                         : has_run || known.is_copying)) {
+            SetProgress(progress, now, look);
+        }
+        if (has_ended) {
+            if (!HasGoneWell(task, known, has_run)) m_has_failed = true;
+            known = Known{finish_time, run};
+        }
+        if (m_task_id || look.is_active || has_ended) m_looks.push_back(std::move(look));
     }
-    m_active = std::move(active);
 }

@@ -7,6 +7,7 @@
 #include <cstdint>
 #include <ctime>
 #include <deque>
+#include <map>
 #include <optional>
 #include <string>
 #include <vector>
@@ -36,7 +37,7 @@ public:
     [[nodiscard]] const std::vector<TaskLook>& Looks() const { return m_looks; }
     // True once a run was seen, or had begun since the first look, and none goes on.
     [[nodiscard]] bool HasEnded() const { return m_has_seen_run && !m_is_any_active; }
-    // Whether the last that ended did not end well.
+    // Whether one that ended did not end well, or was taken out of the queue before it could begin.
     [[nodiscard]] bool HasFailed() const { return m_has_failed; }
 
 private:
@@ -45,12 +46,21 @@ private:
         uint64_t bytes;
     };
 
-    TaskLook LookAt(const PObject& task, const PObject& progress, time_t now);
+    // What is known of a task from the looks before.
+    struct Known {
+        uint64_t finish_time;  // of its last run that has been dealt with
+        uint64_t run;          // the daemon's count of runs then
+        bool is_active = false;
+        bool is_copying = false;  // or has been, since then
+    };
+
+    static bool HasGoneWell(const PObject& task, const Known& known, bool has_run);
+    void SetProgress(const PObject& progress, time_t now, TaskLook& look);
     uint64_t Rate(uint64_t run, uint64_t bytes, time_t now);
 
     std::optional<uint64_t> m_task_id;
     std::vector<TaskLook> m_looks;
-    std::vector<uint64_t> m_active;       // ids, at the last look
+    std::map<uint64_t, Known> m_known;    // by task id
     std::optional<uint64_t> m_first_run;  // the daemon's count of runs at the first look
     std::deque<Sample> m_samples;         // of the run m_sampled_run
     uint64_t m_sampled_run = 0;

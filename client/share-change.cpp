@@ -2,8 +2,9 @@
 
 #include "client/box-admin.h"
 #include "client/exit-status.h"
+#include "client/held-signals.h"
 #include "client/share-tasks.h"
-#include "client/text.h"
+#include "client/shell-word.h"
 
 namespace {
 
@@ -62,8 +63,9 @@ void LetTasksFollow(const DaemonClient& daemon, const std::string& name,
                     const std::string& new_name) {
     const std::string left = WithDaemon(
         "the share is renamed, but the daemon did not answer, and its tasks may still name the old "
-        "one; when it runs, \"ferrixctl hook post_path_change 'origin_share_name=" +
-            Printable(name) + "' 'share_name=" + Printable(new_name) + "'\" lets them follow",
+        "one; when it runs, \"ferrixctl hook post_path_change " +
+            ShellWord("origin_share_name=" + name) + " " + ShellWord("share_name=" + new_name) +
+            "\" lets them follow",
         [&] {
             SendPathChange(daemon, name, new_name);
             return TaskLabels(TasksOfShare(daemon.Tasks(), name));
@@ -80,6 +82,8 @@ void LetTasksFollow(const DaemonClient& daemon, const std::string& name,
 std::string RenameShareOfTasks(const DaemonClient& daemon, const std::string& name,
                                const std::string& new_name) {
     CheckRenameShare(name, new_name);
+    // Broken off half-way, the tasks of the share would stay out of service until a restart.
+    const HeldSignals held;
     WithDaemon(StartFirst("the tasks of the share would not follow"),
                [&] { LetTasksGo(daemon, name); });
     std::string path;
@@ -96,6 +100,7 @@ std::string RenameShareOfTasks(const DaemonClient& daemon, const std::string& na
 std::string RemoveShareOfTasks(const DaemonClient& daemon, const std::string& name,
                                bool with_tasks) {
     CheckRemoveShare(name);
+    const HeldSignals held;
     const auto tasks_now = [&] { return TasksOfShare(daemon.Tasks(), name); };
     const std::string unknown = StartFirst("it is not known which tasks use the share");
     const std::string used_by = TaskLabels(WithDaemon(unknown, tasks_now));

@@ -6,6 +6,9 @@
 #include "client/exit-status.h"
 #include "client/text.h"
 #include "platform/sdk-share.h"
+#include "platform/task-utils.h"
+#include "utils/confined-path.h"
+#include "utils/file-op.h"
 
 namespace {
 
@@ -51,4 +54,21 @@ ShareFolder ParseShareFolder(const std::string& text) {
     return {share, CleanFolder(path.substr(share_path.size()))};
 }
 
-std::string ParseDeviceFolder(const std::string& text) { return CleanFolder(text); }
+std::string ParseDeviceFolder(const std::string& text, const std::string& mount_path) {
+    std::string folder = CleanFolder(text);
+    if (mount_path.empty() || !text.starts_with('/')) return folder;
+    const std::string root = CleanFolder(mount_path);
+    if (folder == root) return "/";
+    return folder.starts_with(root + "/") ? folder.substr(root.size()) : folder;
+}
+
+void CheckDeviceFolder(const std::string& mount_path, const std::string& folder) {
+    std::string path;
+    GetUSBDirFullPath(mount_path, folder, path);
+    const ConfinedRoot root(mount_path);
+    FSInfo info;
+    if (FSStat(path, info) == 0 && info.exist && info.type == FS_TYPE_DIR) return;
+    throw CommandError(EXIT_REFUSED, "the device on " + Printable(mount_path) +
+                                         " has no folder \"" + Printable(folder) +
+                                         "\": look what it has, or leave --from out for all of it");
+}

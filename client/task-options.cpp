@@ -1,6 +1,7 @@
 #include "client/task-options.h"
 
 #include "client/exit-status.h"
+#include "client/task-text.h"
 #include "db/task-info.h"
 #include "ipc/pobject.h"
 
@@ -38,16 +39,19 @@ void AddTaskOptions(CLI::App& command, TaskOptions& options) {
             .add_option("--versions", options.versions,
                         "Version: how many versions are kept; older ones are removed")
             ->check(CLI::Range(uint64_t{1}, uint64_t{INT64_MAX}));
+    CLI::Option* rotation =
+        command
+            .add_option("--rotation", options.rotation,
+                        "Version: which go first: the \"oldest\", or a \"smart\" choice that keeps "
+                        "one an hour, a day, a week; a new task keeps 256 if --versions does not "
+                        "say how many")
+            ->check(CLI::IsMember({"smart", "oldest"}));
     command
         .add_flag_callback(
             "--all-versions", [&options] { options.keeps_all_versions = true; },
             "Version: nothing is removed")
-        ->excludes(versions);
-    command
-        .add_option("--rotation", options.rotation,
-                    "Version: which go first: the \"oldest\", or a \"smart\" choice that keeps "
-                    "one an hour, a day, a week")
-        ->check(CLI::IsMember({"smart", "oldest"}));
+        ->excludes(versions)
+        ->excludes(rotation);
 }
 
 void SetTaskKeys(const TaskOptions& options, PObject& request) {
@@ -74,7 +78,26 @@ void SetTaskKeys(const TaskOptions& options, PObject& request) {
     }
     if (options.keeps_all_versions) request["enable_rotation"] = false;
     if (!options.rotation.empty()) {
+        request["enable_rotation"] = true;
         request["rotation_policy"] = static_cast<int>(
             options.rotation == "smart" ? ROTATION_POLICY_CONDITIONAL : ROTATION_POLICY_OLDEST);
+    }
+}
+
+void CheckStrategy(const TaskOptions& options, int strategy) {
+    const auto refuse = [strategy](const std::string& names, int fitting) {
+        throw CommandError(EXIT_USAGE, names + " are for the strategy " + StrategyText(fitting) +
+                                           ", and this is " + StrategyText(strategy));
+    };
+    const bool sorts = options.uses_date_folders || options.renames || options.keeps_folders ||
+                       options.moves || !options.conflict.empty();
+    if (sorts && strategy != COPY_STRATEGY_INCREMENTAL) {
+        refuse("--date-folders, --rename, --keep-folders, --flat, --move and --conflict",
+               COPY_STRATEGY_INCREMENTAL);
+    }
+    const bool rotates =
+        options.versions || options.keeps_all_versions || !options.rotation.empty();
+    if (rotates && strategy != COPY_STRATEGY_VERSION) {
+        refuse("--versions, --all-versions and --rotation", COPY_STRATEGY_VERSION);
     }
 }

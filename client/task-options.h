@@ -26,8 +26,13 @@ void AddTaskOptions(CLI::App& command, TaskOptions& options);
 
 // Puts what was said into the request, under the keys of the daemon. Files that go into folders by
 // date or get new names do not keep the folders of the source: the one turns the other off, and
-// both at once are refused (CommandError, EXIT_USAGE).
+// both at once are refused (CommandError, EXIT_USAGE). Who names a rotation wants one: it is
+// switched on.
 void SetTaskKeys(const TaskOptions& options, PObject& request);
+
+// Refuses what a task of this strategy (CopyStrategy) would pass over in silence: CommandError,
+// EXIT_USAGE.
+void CheckStrategy(const TaskOptions& options, int strategy);
 
 // A pair of options "--NAME" and "--no-NAME" that exclude each other.
 void AddSwitch(CLI::App& command, const std::string& name, const std::string& opposite,

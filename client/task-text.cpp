@@ -41,6 +41,13 @@ std::string DestinationText(const PObject& task) {
     return IsExport(task) ? OnDevice(task, "destination_path") : InShare(task, "destination_path");
 }
 
+std::string DeviceText(const PObject& task) {
+    const std::string producer = task["producer"].AsString();
+    const std::string product = task["product"].AsString();
+    const char* between = producer.empty() || product.empty() ? "" : " ";
+    return Printable(producer + between + product);
+}
+
 std::string StrategyText(int strategy) {
     switch (strategy) {
         case COPY_STRATEGY_VERSION:

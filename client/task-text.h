@@ -17,6 +17,9 @@ class PObject;
 [[nodiscard]] std::string SourceText(const PObject& task);
 [[nodiscard]] std::string DestinationText(const PObject& task);
 
+// Maker and product of its device, as far as they are known: "Maker Stick"; empty for neither.
+[[nodiscard]] std::string DeviceText(const PObject& task);
+
 // "version", "mirror", "incremental"; the number for any other.
 [[nodiscard]] std::string StrategyText(int strategy);
 // "import", "photo import", "export"; the number for any other.

@@ -8,11 +8,15 @@
 
 namespace {
 
-bool WantsColour() {
+bool IsColourRefused() {
     const char* refused = getenv("NO_COLOR");
-    if (refused != nullptr && *refused != '\0') return false;
+    return refused != nullptr && *refused != '\0';
+}
+
+// It knows no orders. One that is not named may not know them either.
+bool IsDumb() {
     const char* kind = getenv("TERM");
-    return kind != nullptr && std::string_view(kind) != "dumb";
+    return kind == nullptr || std::string_view(kind) == "dumb";
 }
 
 const char* Sequence(Colour colour) {
@@ -40,7 +44,8 @@ const char* Sequence(Colour colour) {
 Terminal::Terminal(int descriptor)
     : m_descriptor(descriptor),
       m_is_terminal(isatty(descriptor) == 1),
-      m_has_colour(m_is_terminal && WantsColour()) {}
+      m_is_dumb(IsDumb()),
+      m_has_colour(m_is_terminal && !m_is_dumb && !IsColourRefused()) {}
 
 std::string Terminal::Paint(Colour colour, const std::string& text) const {
     if (!m_has_colour || colour == Colour::PLAIN) return text;

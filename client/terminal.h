@@ -15,6 +15,8 @@ public:
     explicit Terminal(int descriptor);
 
     [[nodiscard]] bool IsTerminal() const { return m_is_terminal; }
+    // Whether what is written can be drawn over.
+    [[nodiscard]] bool CanRedraw() const { return m_is_terminal && !m_is_dumb; }
     // The text in that colour; the text itself where colours are not wanted.
     [[nodiscard]] std::string Paint(Colour colour, const std::string& text) const;
     // Columns of the terminal now; 80 when that cannot be told.
@@ -23,5 +25,6 @@ public:
 private:
     int m_descriptor;
     bool m_is_terminal;
+    bool m_is_dumb;
     bool m_has_colour;
 };

@@ -1,5 +1,7 @@
 #include "service/service-ctrl.h"
 
+#include <unistd.h>
+
 #include <utility>
 
 #include "daemon/process-shell.h"
@@ -78,6 +80,13 @@ int ServiceCtrl::StartService() {
 int ServiceCtrl::StopService() {
     const ServiceLock lock;
     return StopLocked();
+}
+
+int ServiceCtrl::SettleStop() {
+    const ServiceLock lock;
+    if (IsRunning()) return LogFailure("the daemon runs");
+    unlink(m_places.pid_file.c_str());  // its number may be given to another process
+    return FinishStop();
 }
 
 bool ServiceCtrl::MoveRepoVolume(const std::string& from, const std::string& to) {

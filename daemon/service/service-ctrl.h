@@ -22,6 +22,11 @@ public:
     // end could not be told to everybody.
     [[nodiscard]] int StopService();
 
+    // For a daemon that has ended by itself, in a crash or a power cut: tells what StopService()
+    // would have told, the state STOPPED and the timetables taken out. 0, or -1 (logged), as when a
+    // daemon runs.
+    [[nodiscard]] int SettleStop();
+
     // Moves the repository to the volume `to` and starts the service there; an empty `from` makes a
     // new one. The same volume is a success and changes nothing; one that is not mounted or not
     // writable is refused. False (logged) leaves the state ERROR once the daemon has been stopped,

@@ -208,15 +208,18 @@ TEST_F(NotifierTest, AWrongCommandLineSendsNothing) {
         {"--hook","post_mount"},
         {"--hook",                "", "--type", "volume_hook"},
         {"--hook",              "post_mount", "--type", "any_hook"},
-        {"--hook",             "post_mount", "--type", "volume_hook", "mountpoint"},
-        {"--hook", "post_mount", "--type", "volume_hook", "=/media/card"},
-        {"--hook",        "post_mount", "--type", "volume_hook", "action=stop"},
-        {"--hook",        "post_mount", "--type", "volume_hook", "_action=stop"},
-        {"--hook",                "post_mount", "--type", "volume_hook", "need_ack="},
-        {"--type","volume_hook"},
-        {"mountpoint=/media/card"  },
-        {"--unknown"        },
-        {"7"               },
+        {"--hook",             "post_moun", "--type", "volume_hook"},
+        {"--hook", "post_moun", "--type", "ferrix_hook"},
+        {"--hook",        "post_moun", "--type", "share_hook"},
+        {"--hook",        "post_mount", "--type", "volume_hook", "mountpoint"},
+        {"--hook",                "post_mount", "--type", "volume_hook", "=/media/card"},
+        {"--hook","post_mount", "--type", "volume_hook", "action=stop"},
+        {"--hook",   "post_mount", "--type", "volume_hook", "_action=stop"},
+        {"--hook",         "post_mount", "--type", "volume_hook", "need_ack="},
+        {"--type",                "volume_hook"},
+        {"mountpoint=/media/card"},
+        {"--unknown"  },
+        {"7"        },
     };
     for (const std::vector<const char*>& arguments : wrong) {
         std::string line;
@@ -226,6 +229,11 @@ TEST_F(NotifierTest, AWrongCommandLineSendsNothing) {
         EXPECT_EQ("", m_output) << line;
         EXPECT_FALSE(listener.Wait()) << line;
     }
+}
+
+TEST_F(NotifierTest, ANameThatTheDaemonDoesNotKnowIsToldWithThoseThatThereAre) {
+    EXPECT_EQ(EXIT_USAGE, Run({"--hook", "post_moun", "--type", "volume_hook"}));
+    EXPECT_THAT(m_errors, HasSubstr("there is no hook \"post_moun\"; there are post_mount, "));
 }
 
 TEST_F(NotifierTest, AHostileWordCannotSteerTheTerminal) {

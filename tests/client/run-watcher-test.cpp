@@ -6,10 +6,12 @@ namespace {
 
 constexpr time_t NOON = 1'800'000'000;
 
-PObject Task(uint64_t id, const char* status) {
+PObject Task(uint64_t id, const char* status, time_t finish_time = 0, int error = 0) {
     PObject task;
     task["id"] = id;
     task["task_status"] = status;
+    task["latest_finish_time"] = static_cast<uint64_t>(finish_time);
+    task["error_code"] = error;
     return task;
 }
 
@@ -45,9 +47,58 @@ TEST(RunWatcherTest, ARunBetweenTwoLooksIsSeen) {
     RunWatcher watcher(3);
     watcher.Update({Task(3, "successful")}, Progress(7, 3, 1, 1), NOON);
     EXPECT_FALSE(watcher.HasEnded()) << "that run was before";
-    watcher.Update({Task(3, "failed")}, Progress(8, 3, 0, 0), NOON + 1);
+    watcher.Update({Task(3, "failed", NOON, 2)}, Progress(8, 3, 0, 0), NOON + 1);
     EXPECT_TRUE(watcher.HasEnded());
     EXPECT_TRUE(watcher.HasFailed());
+}
+
+TEST(RunWatcherTest, ARunThatEndsWithItsDeviceEjectedIsJudgedByItsResult) {
+    for (const int error : {0, 5}) {
+        RunWatcher watcher(3);
+        watcher.Update({Task(3, "copying", NOON - 100)}, Progress(1, 3, 2, 100), NOON);
+        watcher.Update({Task(3, "unmounted", NOON + 1, error)}, Progress(1, 3, 9, 900), NOON + 1);
+        EXPECT_TRUE(watcher.HasEnded());
+        EXPECT_EQ(error != 0, watcher.HasFailed());
+        EXPECT_EQ(9U, watcher.Looks().at(0).files);
+    }
+}
+
+TEST(RunWatcherTest, ATaskTakenOutOfTheQueueHasNotRun) {
+    RunWatcher watcher(3);
+    watcher.Update({Task(3, "waiting", NOON - 100)}, Progress(1, 3, 2, 100), NOON);
+    watcher.Update({Task(3, "successful", NOON - 100)}, Progress(2, 4, 0, 0), NOON + 1);
+    EXPECT_TRUE(watcher.HasEnded());
+    EXPECT_TRUE(watcher.HasFailed()) << "that success is of an earlier run";
+    EXPECT_FALSE(watcher.Looks().at(0).has_progress);
+}
+
+TEST(RunWatcherTest, AWaitingTaskThatRunsBetweenTwoLooksHasRun) {
+    RunWatcher watcher(3);
+    watcher.Update({Task(3, "waiting", NOON - 100)}, Progress(1, 4, 2, 100), NOON);
+    // Another run has begun since: only the time tells.
+    watcher.Update({Task(3, "successful", NOON)}, Progress(3, 4, 0, 0), NOON + 1);
+    EXPECT_TRUE(watcher.HasEnded());
+    EXPECT_FALSE(watcher.HasFailed());
+}
+
+TEST(RunWatcherTest, OneFailureAmongSeveralRunsIsKept) {
+    RunWatcher watcher(std::nullopt);
+    watcher.Update({Task(3, "copying"), Task(4, "waiting")}, Progress(1, 3, 1, 10), NOON);
+    watcher.Update({Task(3, "failed", NOON, 2), Task(4, "copying")}, Progress(2, 4, 0, 0),
+                   NOON + 1);
+    EXPECT_FALSE(watcher.HasEnded());
+    watcher.Update({Task(3, "failed", NOON, 2), Task(4, "successful", NOON + 2)},
+                   Progress(2, 4, 1, 10), NOON + 2);
+    EXPECT_TRUE(watcher.HasEnded());
+    EXPECT_TRUE(watcher.HasFailed());
+    EXPECT_EQ(1U, watcher.Looks().size()) << "the first was shown when it ended";
+}
+
+TEST(RunWatcherTest, AnIdleTaskDoesNotShowTheNumbersOfItsLastRun) {
+    RunWatcher watcher(3);
+    watcher.Update({Task(3, "successful", NOON - 100)}, Progress(1, 3, 60, 1000), NOON);
+    EXPECT_FALSE(watcher.HasEnded());
+    EXPECT_FALSE(watcher.Looks().at(0).has_progress);
 }
 
 TEST(RunWatcherTest, ARunOfAnotherTaskIsNotItsOwn) {

@@ -1,7 +1,10 @@
 #include "client/share-change.h"
 
 #include <gmock/gmock.h>
+#include <pthread.h>
 
+#include <atomic>
+#include <csignal>
 #include <mutex>
 
 #include "client/exit-status.h"
@@ -119,6 +122,32 @@ TEST_F(ShareChangeTest, ARenameIsToldBeforeAndAfter) {
               m_events);
 }
 
+// Ctrl-C between the hooks would leave the tasks out of service.
+TEST_F(ShareChangeTest, AChangeIsNotBrokenOffHalfway) {
+    static std::atomic<int> stops = 0;
+    struct sigaction note {};
+    note.sa_handler = [](int) { ++stops; };
+    for (const int number : {SIGINT, SIGTERM, SIGHUP}) {
+        struct sigaction before {};
+        ASSERT_EQ(0, sigaction(number, &note, &before));
+        for (const bool is_removal : {false, true}) {
+            stops = 0;
+            FakeBoxAdmin::Reset().on_call = [this, number](const std::string& what) {
+                Note(what);
+                if (what.rfind("check", 0) == 0) return;
+                pthread_kill(pthread_self(), number);
+                EXPECT_EQ(0, stops) << "between the hooks";
+            };
+            m_task_share = "photos";
+            StartDaemon();
+            is_removal ? Remove(true) : Rename();
+            EXPECT_EQ(EXIT_DONE, m_status) << m_text;
+            EXPECT_EQ(1, stops) << "afterwards it counts";
+        }
+        ASSERT_EQ(0, sigaction(number, &before, nullptr));
+    }
+}
+
 TEST_F(ShareChangeTest, ARenameThatCannotBeDisturbsNoTask) {
     StartDaemon();
     m_failures["check rename photos pictures"] = "no such share";
@@ -162,7 +191,7 @@ TEST_F(ShareChangeTest, WhenTheLastHookIsNotAnsweredTheTextTellsHowToSendItAgain
     EXPECT_EQ(EXIT_NOT_REACHABLE, m_status);
     EXPECT_THAT(m_text, AllOf(HasSubstr("the share is renamed, but"),
                               HasSubstr("ferrixctl hook post_path_change "
-                                        "'origin_share_name=photos' 'share_name=pictures'")));
+                                        "origin_share_name=photos share_name=pictures\"")));
 }
 
 TEST_F(ShareChangeTest, TasksThatHaveNotFollowedAreNamed) {

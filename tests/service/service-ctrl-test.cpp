@@ -13,6 +13,7 @@ class ServiceCtrlTest : public ServiceTest {
 protected:
     int Start() { return Ctrl().StartService(); }
     int Stop() { return Ctrl().StopService(); }
+    int SettleStop() { return Ctrl().SettleStop(); }
     int AddSchedule(bool listable) {
         FakeSchedEntry entry;
         entry.app = "KELD.KDS.Ferrix.Application";
@@ -142,6 +143,21 @@ TEST_F(ServiceCtrlTest, AStopOfNothingChangesNoState) {
     EXPECT_EQ(-1, Stop());
     EXPECT_EQ(StateText(7, "err_sys"), Status());
     EXPECT_TRUE(m_fake.BoxLogCodes().empty());
+}
+
+TEST_F(ServiceCtrlTest, AServiceWhoseDaemonHasCrashedIsBroughtToItsEnd) {
+    const int entry = AddSchedule(true);
+    ASSERT_EQ(0, SetServiceStatus({SERVICE_STATE_RUNNING, ""}));
+    {
+        ChildDaemon daemon(m_pid_file, ChildDaemon::ENDS_AT_SIGTERM);
+        EXPECT_EQ(-1, SettleStop()) << "that one runs";
+        EXPECT_EQ(StateText(4), Status());
+        EXPECT_TRUE(IsListable(entry));
+    }
+    EXPECT_EQ(0, SettleStop());
+    EXPECT_FALSE(IsListable(entry));
+    EXPECT_EQ(StateText(6), Status());
+    EXPECT_NE(0, access(m_pid_file.c_str(), F_OK));
 }
 
 TEST_F(ServiceCtrlTest, EachStepOfAStopThatFailsIsToldAndTheOthersAreDone) {

@@ -56,6 +56,28 @@ def test_a_service_from_nothing_to_its_end(box):
     assert "does not run" in ctl.ok("service", "stop")
 
 
+def test_a_service_whose_daemon_has_crashed_is_stopped(box):
+    """After a crash, with its process id left behind or lost with a power cut, status tells it and
+    stop brings the service to its end; who is not root is told to be."""
+    for pid_file_stays in (True, False):
+        box.start()
+        box.kill()
+        if not pid_file_stays:
+            os.unlink("/run/ferrixd.pid")
+        status = ctl.read("service", "status")
+        assert status["state_text"].startswith("not running") and status["pid"] == 0, status
+        assert "service start" in ctl.ok("service", "status")
+        assert "ended by itself" in ctl.ok("service", "stop")
+        assert ctl.read("service", "status")["state"] == 6
+        assert "does not run" in ctl.ok("service", "stop")
+    box.start()
+    for words, wanted in ((("service", "status"), ctl.REFUSED),
+                          (("task", "list"), ctl.NOT_REACHABLE)):
+        done = subprocess.run([ctl.PROGRAM, *words], check=False, text=True, user=65534, group=65534,
+                              capture_output=True)
+        assert done.returncode == wanted and "as root" in done.stderr, done
+
+
 def test_a_repository_is_made_and_moved(box):
     """repo init makes an empty repository; service move takes it to another volume, tasks and all."""
     os.makedirs("/volume2")
@@ -108,6 +130,7 @@ def test_everything_that_can_be_said_about_a_new_task(box):
     other = box.add_device("other")
     other.mount()
     os.makedirs("/volume1/photos/inbox")
+    os.makedirs(stick.path("DCIM"))
     assert "--device" in ctl.refused("task", "add", "--to", "photos", status=ctl.USAGE)
     task = int(ctl.ok("task", "add", "--device", stick.mountpoint, "--to", "photos/inbox",
                       "--strategy", "incremental", "--date-folders", "--rename", "--move",
@@ -197,17 +220,28 @@ def test_a_run_is_watched_in_a_pipe_and_on_a_terminal(box):
 
 
 def test_a_run_that_is_cancelled_is_not_a_success(box):
-    """cancel breaks the run off; the watcher's exit status says so."""
-    _, stick = prepare(box, files=0)
-    rng = tree.rng(9)
-    for number in range(24):
-        tree.write(stick.path(f"big{number}"), rng, 2 << 20)
-    task = ctl.ok("task", "add", "--to", "photos", "--run").strip()
-    with subprocess.Popen([ctl.PROGRAM, "task", "watch", task], stdout=subprocess.DEVNULL,
+    """A task that ran well before is cancelled behind a long run; its watcher's exit status says
+    so. One whose device is ejected at the end of a good run counts as well."""
+    _, stick = prepare(box)
+    box.add_share("big")
+    other = box.add_device("other", size_mb=900)
+    other.mount()
+    sh("sh", "-c", f"for i in $(seq 200); do head -c 4M /dev/urandom > {other.path('f')}$i; done")
+    task = ctl.ok("task", "add", "--device", stick.mountpoint, "--to", "photos", "--run").strip()
+    assert ctl.run("task", "watch", task)[0] == ctl.DONE or box.wait_run(int(task), 1)
+    long_run = ctl.ok("task", "add", "--device", other.mountpoint, "--to", "big", "--eject",
+                      "--run").strip()
+    ctl.ok("task", "run", task)
+    with subprocess.Popen([ctl.PROGRAM, "task", "watch", task], stdout=subprocess.PIPE,
                           stderr=subprocess.PIPE, text=True) as watcher:
-        box.wait_status(int(task), "copying", "waiting")
+        assert "waiting" in watcher.stdout.readline()
         ctl.ok("task", "cancel", task)
-        assert watcher.wait(60) in (ctl.REFUSED, ctl.DONE)
+        assert watcher.wait(60) == ctl.REFUSED
+        assert "cancelled" in watcher.stderr.read()
+    assert box.status(int(task)) == "successful"
+    status, output, errors = ctl.run("task", "watch", long_run)
+    assert (status, errors) == (ctl.DONE, ""), output + errors
+    assert box.task(int(long_run))["error_code"] == 0
 
 
 def test_the_button_hooks_and_settings(box):

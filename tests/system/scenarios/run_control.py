@@ -7,7 +7,7 @@ import random
 import threading
 import time
 
-from ferrix import tree, wire
+from ferrix import ctl, tree, wire
 from ferrix.box import PACKAGE, sh, wait_until
 from scenarios.default_tasks import add_default_task
 
@@ -395,6 +395,7 @@ def test_the_copy_button_and_the_default_task(box):
     press_button()
     assert box.wait_run(task, 1) == "successful"
     assert os.listdir("/volume1/photos") == ["a.jpg"]
+    assert [device["task_id"] for device in ctl.read("device", "list")] == [task]
 
 
 def test_a_default_task_is_switched_off_and_on(box):
