@@ -136,8 +136,11 @@ int FSOpenDir(const std::string& path, uint32_t flags, FSDir& handle) {
     }
     UniqueDir stream(fd.IsValid() ? fdopendir(fd.Get()) : nullptr);
     if (stream == nullptr) {
+        const int error = errno;
         SLOG_ERR("FSOpenDir: Failed to open directory '%s'. %s\n", path.c_str(),
-                 std::strerror(errno));
+                 std::strerror(error));
+        fd.Reset();
+        errno = error;
         return -1;
     }
     (void)fd.Release();  // the stream's now

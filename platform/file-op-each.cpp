@@ -1,3 +1,4 @@
+#include <cerrno>
 #include <utility>
 #include <vector>
 
@@ -30,6 +31,13 @@ struct SubDir {
 };
 
 bool IsSkipped(const std::string& name) { return name == "." || name == ".." || name == "@eaDir"; }
+
+// Whether the errno of opening a folder tells of the folder itself: it is gone, something else, or
+// closed to us. All others tell that the system could not look.
+bool CountsAsEmpty(int error) {
+    return error == ENOENT || error == ENOTDIR || error == ELOOP || error == EACCES ||
+           error == EPERM;
+}
 
 void LogDir(const FSVisitor& visitor, const std::string& name, int index) {
     if (index < 0) {
@@ -101,8 +109,9 @@ private:
         FSDir dir;
         const uint32_t dir_flags = (m_flags & FS_EACH_STAT) != 0 ? FS_DIR_STAT : 0;
         if (FSOpenDir(m_path, dir_flags, dir) != 0) {
+            const int error = errno;
             SLOG_ERR("FSOpenDir(%s)\n", m_path.c_str());
-            return 0;
+            return CountsAsEmpty(error) ? 0 : FS_EACH_IO_ERROR;
         }
         const size_t length = m_path.size();
         FSDirEntry entry;
@@ -117,13 +126,14 @@ private:
             if (!IsIgnored(entry, m_path, m_visitor.prefix_length, m_visitor.filter)) Take(entry);
             m_path.resize(length);
         }
-        return result == 0 ? 0 : FS_EACH_IO_ERROR;
+        return result == 0 && m_visitor.list->HasRoom() ? 0 : FS_EACH_IO_ERROR;
     }
 
     void Take(const FSDirEntry& entry) {
         Frame& top = m_frames.back();
         if (entry.type == FS_TYPE_FILE) {
-            // A refusal (a name that comes twice) leaves the entry out, as the list is then right.
+            // A name that comes twice is left out, as the list is then right; one for which there
+            // was no room is missed at the end of the folder.
             (void)m_visitor.list->AddFile(top.list_index, entry.name, entry.mtime, entry.size);
             SLOG_INFO("FileProcessor (%d): local list: add file '%s'\n", m_visitor.worker_id,
                       entry.name.c_str());

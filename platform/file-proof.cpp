@@ -134,3 +134,26 @@ FSCompareResult FSCompareOnMedium(const std::string& source, const std::string& 
         if (static_cast<size_t>(left) < kBufferBytes) return FS_COMPARE_EQUAL;
     }
 }
+
+int FileIdentity::Take(const std::string& path) {
+    m_file = PathPlace(path).Open(O_PATH | O_NOFOLLOW);
+    if (m_file.IsValid() && fstat(m_file.Get(), &m_state) == 0) return 0;
+    SLOG_ERR("Failed to look at '%s'. %s", path.c_str(), std::strerror(errno));
+    m_file.Reset();
+    return -1;
+}
+
+bool FileIdentity::IsAt(const std::string& path) const {
+    const PathPlace place(path);
+    struct stat now {};
+    if (!m_file.IsValid() || !place.IsReached() ||
+        fstatat(place.DirFd(), place.Name(), &now, AT_SYMLINK_NOFOLLOW) != 0) {
+        return false;
+    }
+    const auto is_same_time = [](const timespec& left, const timespec& right) {
+        return left.tv_sec == right.tv_sec && left.tv_nsec == right.tv_nsec;
+    };
+    return now.st_dev == m_state.st_dev && now.st_ino == m_state.st_ino &&
+           now.st_mode == m_state.st_mode && now.st_size == m_state.st_size &&
+           is_same_time(now.st_mtim, m_state.st_mtim) && is_same_time(now.st_ctim, m_state.st_ctim);
+}

@@ -27,7 +27,10 @@ int NamePool::Add(std::string_view name, const char** out) {
     size_t slot = SlotOf(name, hash);
     if (m_slots[slot].name == nullptr) {
         const char* stored = Store(name);
-        if (stored == nullptr) return -1;
+        if (stored == nullptr) {
+            m_has_room = false;
+            return -1;
+        }
         // At most four fifths full: beyond that the runs of taken slots get long.
         if ((m_count + 1) * 5 > m_slots.size() * 4) {
             Grow();

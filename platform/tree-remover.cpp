@@ -73,11 +73,26 @@ bool TreeRemover::Enter(int parent_fd, const char* name) {
         NoteFailure();
         return false;
     }
+    if (!IsOnSameFileSystem(fd.Get())) {
+        SLOG_ERR("Failed to remove '%s', another file system is mounted there\n", m_path.c_str());
+        NoteFailure();
+        return false;
+    }
     m_frames.emplace_back();
     m_frames.back().fd = std::move(fd);
     m_frames.back().path_length = m_path.size();
     CloseFarFolder();
     return true;
+}
+
+// The outermost folder is measured by the one above it.
+bool TreeRemover::IsOnSameFileSystem(int fd) {
+    struct stat st {};
+    if (m_frames.empty()) {
+        if (fstatat(fd, "..", &st, 0) != 0) return false;
+        m_device = st.st_dev;
+    }
+    return fstat(fd, &st) == 0 && st.st_dev == m_device;
 }
 
 // Closes the innermost open folder beyond the number that may be open.

@@ -1,5 +1,9 @@
 // Removes a folder with all that it holds, however deep and wide, without following a link.
 //
+// A folder that lies on another file system than the outermost one is not gone into, and stays:
+// somebody has mounted it there, and what it holds belongs elsewhere. The outermost folder itself
+// may be no such mount point either.
+//
 // Every call is made relative to the open folder that holds the entry. At most MAX_OPEN folders are
 // open at a time: those further up are closed and reached again through "..", which has to be the
 // same folder still. An object does one removal, on one thread.
@@ -42,6 +46,7 @@ private:
 
     [[nodiscard]] std::string NameOfTop() const;
     bool Enter(int parent_fd, const char* name);
+    [[nodiscard]] bool IsOnSameFileSystem(int fd);
     void CloseFarFolder();
     bool ReopenParent();
     void Sweep(Frame& frame);
@@ -55,5 +60,6 @@ private:
     std::string m_path;  // of the entry in hand; grows and shrinks
     std::vector<Frame> m_frames;
     std::vector<char> m_buffer;
+    dev_t m_device = 0;  // of the outermost folder
     bool m_has_failed = false;
 };

@@ -11,7 +11,6 @@
 #include "utils/confined-path.h"
 #include "utils/error-code.h"
 #include "utils/file-op.h"
-#include "utils/file-proof.h"
 #include "utils/log.h"
 
 int CopyHandler::Handle() {
@@ -74,6 +73,7 @@ int CopyHandler::StatSource() {
         SLOG_ERR("Source file does not exist '%s'.", m_copy_from_full_path.c_str());
         return ERR_SRC_MISS;
     }
+    if (IsSourceRemoved() && m_source.Take(m_copy_from_full_path) < 0) return ERR_FILE_OPERATION;
     return ERR_SUCCESS;
 }
 
@@ -134,17 +134,19 @@ int CopyHandler::HandleCopyError(int keld_error, int overwrite) {
     }
 }
 
-bool CopyHandler::CheckFileIntegrity() const {
-    FSInfo info;
+int CopyHandler::LookAtDestination(FSInfo& info, int error_when_gone) const {
     if (FSStat(m_copy_to_full_path, info) < 0) {
         SLOG_ERR("Failed to FSStat '%s'.", m_copy_to_full_path.c_str());
-        return false;
+        return ERR_FILE_OPERATION;
     }
-    if (!info.exist) {
-        SLOG_ERR("Destination file does not exist '%s', should retry.",
-                 m_copy_to_full_path.c_str());
-        return false;
-    }
+    if (info.exist) return ERR_SUCCESS;
+    SLOG_ERR("Destination file does not exist '%s', should retry.", m_copy_to_full_path.c_str());
+    return error_when_gone;
+}
+
+bool CopyHandler::CheckFileIntegrity() const {
+    FSInfo info;
+    if (LookAtDestination(info, ERR_FILE_OPERATION) < 0) return false;
     if (info.size != m_src_info.size) {
         SLOG_ERR("File size not matched '%llu', '%llu'.", Llu(m_src_info.size), Llu(info.size));
         return false;
@@ -155,15 +157,7 @@ bool CopyHandler::CheckFileIntegrity() const {
 
 int CopyHandler::HandleDstExists() {
     FSInfo info;
-    if (FSStat(m_copy_to_full_path, info) < 0) {
-        SLOG_ERR("Failed to FSStat '%s'.", m_copy_to_full_path.c_str());
-        return ERR_FILE_OPERATION;
-    }
-    if (!info.exist) {
-        SLOG_ERR("Destination file does not exist '%s', should retry.",
-                 m_copy_to_full_path.c_str());
-        return ERR_DST_EXISTS;
-    }
+    if (const int result = LookAtDestination(info, ERR_DST_EXISTS); result < 0) return result;
     if (info.size == m_src_info.size && info.mtime == m_src_info.mtime) {
         SLOG_INFO("File can be merged '%s', ignore.", m_copy_to_full_path.c_str());
         m_is_merged = true;
@@ -174,15 +168,8 @@ int CopyHandler::HandleDstExists() {
 
 int CopyHandler::HandleDstTypeConflict() {
     FSInfo info;
-    if (FSStat(m_copy_to_full_path, info) < 0) {
-        SLOG_ERR("Failed to FSStat '%s'.", m_copy_to_full_path.c_str());
-        return ERR_FILE_OPERATION;
-    }
-    if (!info.exist) {
-        SLOG_ERR("Destination file does not exist '%s', should retry.",
-                 m_copy_to_full_path.c_str());
-        return ERR_DST_TYPE_CONFLICT;
-    }
+    if (const int result = LookAtDestination(info, ERR_DST_TYPE_CONFLICT); result < 0)
+        return result;
     return ClearTypeConflict(Task(), m_copy_to_full_path, info.type == FS_TYPE_DIR,
                              IsOverwritePolicy() && !m_must_keep_existing);
 }
@@ -203,10 +190,20 @@ int CopyHandler::Finish() {
 // The source may be the only copy that there is: it goes last.
 int CopyHandler::MoveSource() {
     if (const int result = ProveCopy(); result < 0) return result;
+    if (const int result = CheckSourceUnchanged(); result < 0) return result;
     if (const int result = NoteMove(); result < 0) return result;
     if (const int result = CheckTaskRoots(Task()); result < 0) return result;
+    // Somebody may write to it, or save another file under its name, at any time.
+    if (const int result = CheckSourceUnchanged(); result < 0) return result;
     if (RecycleBin().RemoveFile(m_copy_from_full_path, false) == 0) return ERR_SUCCESS;
     SLOG_ERR("Failed to remove file '%s'", m_copy_from_full_path.c_str());
+    return ERR_FILE_OPERATION;
+}
+
+int CopyHandler::CheckSourceUnchanged() const {
+    if (m_source.IsAt(m_copy_from_full_path)) return ERR_SUCCESS;
+    SLOG_ERR("Source file '%s' has changed since it was copied, it stays, should retry.",
+             m_copy_from_full_path.c_str());
     return ERR_FILE_OPERATION;
 }
 

@@ -9,6 +9,7 @@
 #include <string>
 
 #include "strategy/file-event-handler.h"
+#include "utils/file-proof.h"
 #include "utils/fs-info.h"
 
 class CopyHandler : public FileEventHandler {
@@ -39,6 +40,8 @@ private:
     [[nodiscard]] int CreateParentFolder();
     [[nodiscard]] int RunCopy();
     [[nodiscard]] int CheckCopied() const;
+    // Reads what stands where the copy goes: ERR_SUCCESS, or the error to report.
+    [[nodiscard]] int LookAtDestination(FSInfo& info, int error_when_gone) const;
     [[nodiscard]] bool CheckFileIntegrity() const;
     [[nodiscard]] int HandleCopyError(int keld_error, int overwrite);
     [[nodiscard]] int HandleDstExists();
@@ -46,9 +49,13 @@ private:
     [[nodiscard]] int Finish();
     // Removes the source, once the copy is known to be on the disk and to equal it.
     [[nodiscard]] int MoveSource();
+    // "File operation error", with which the event copies anew, if it is not as it was before the
+    // copy.
+    [[nodiscard]] int CheckSourceUnchanged() const;
     [[nodiscard]] int ProveCopy();
     [[nodiscard]] int HandleDifference();
     void DiscardCopy() const;
 
+    FileIdentity m_source;     // taken before the copy, only if the source is to be removed
     bool m_is_merged = false;  // what stands at the destination was there before
 };

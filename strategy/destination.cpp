@@ -5,6 +5,7 @@
 #include "strategy/root-check.h"
 #include "utils/error-code.h"
 #include "utils/file-op.h"
+#include "utils/file-proof.h"
 #include "utils/log.h"
 
 namespace {
@@ -42,6 +43,19 @@ int ClearTypeConflict(const TaskRunInfo& task, const std::string& path, bool is_
     static_cast<void>(RecycleBin().RemoveFile(path, is_dir));
     SLOG_INFO("Conflict Policy is overwrite, remove '%s', try copy again.", path.c_str());
     return ERR_DST_TYPE_CONFLICT;
+}
+
+int RespellEntry(const std::string& from, const std::string& to) {
+    FileIdentity entry;
+    if (entry.Take(from) < 0) return -1;
+    // Where each spelling has an inode number of its own, the file system sees two names. Where
+    // they share one, the system takes a rename to the same file for done: it needs a name between.
+    if (!entry.IsAt(to)) return FSRename(from, to) == 0 ? 0 : -1;
+    const std::string between = PathDirName(to) + "/.ferrix-respelled";
+    if (FSExists(between) || FSRename(from, between) < 0) return -1;
+    if (FSRename(between, to) == 0) return 0;
+    if (FSRename(between, from) < 0) SLOG_ERR("'%s' is now '%s'", from.c_str(), between.c_str());
+    return -1;
 }
 
 bool IsSpelledOtherwise(const std::string& root, const std::string& path) {

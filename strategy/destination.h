@@ -20,6 +20,10 @@ inline constexpr int DESTINATION_GROUP = 100;
 [[nodiscard]] int ClearTypeConflict(const TaskRunInfo& task, const std::string& path, bool is_dir,
                                     bool is_overwrite);
 
+// Renames an entry to another spelling of its own name, where both find it. 0; -1 on failure, and
+// the entry has its old name, or after a second failure one that the log tells.
+[[nodiscard]] int RespellEntry(const std::string& from, const std::string& to);
+
 // Whether something stands under the path that has another name in its folder, or lies in a folder
 // that has: a file system that ignores case, or keeps short names, finds one file under several
 // names. `root` is a folder above, whose own name is taken as it is. True also when that cannot be

@@ -1,5 +1,6 @@
 // The one way in which user data is deleted: into the share's recycle bin where it has one, else
-// for good. What could not be moved to the bin stays where it is; it is never deleted instead.
+// for good. What could not be moved to the bin stays where it is; it is never deleted instead. A
+// share that does not tell whether it has a bin counts as one without.
 //
 // Without data; made on the stack for each use. Threads: any.
 #pragma once

@@ -70,7 +70,13 @@ int ScanHandler::GetDstList(FileList& /*list*/) { return ERR_SUCCESS; }
 
 bool ScanHandler::IsUnproven(const FileListEntry& /*dst*/) { return false; }
 
+SpellingPairs ScanHandler::FindSpellingPairs(const FileList& /*src_list*/,
+                                             const FileList& /*dst_list*/) {
+    return {};
+}
+
 int ScanHandler::GenerateEvent(const FileList& src_list, const FileList& dst_list) {
+    const SpellingPairs pairs = FindSpellingPairs(src_list, dst_list);
     FileListIterator src = src_list.begin();
     FileListIterator dst = dst_list.begin();
     const FileListIterator src_end = src_list.end();
@@ -85,9 +91,10 @@ int ScanHandler::GenerateEvent(const FileList& src_list, const FileList& dst_lis
         }
         const int order = !has_dst ? 1 : !has_src ? -1 : ComparePaths(src->path, dst->path);
         if (order > 0) {
-            IssueCopy(*src);
+            const FileListEntry* other_half = pairs.OtherHalf(src->path);
+            other_half != nullptr ? IssuePair(*src, *other_half) : IssueCopy(*src);
         } else if (order < 0) {
-            IssueRemove(*dst);
+            if (!pairs.HasDst(dst->path)) IssueRemove(*dst);
         } else {
             IssuePair(*src, *dst);
         }

@@ -9,9 +9,7 @@
 #include <string>
 
 #include "strategy/file-event-handler.h"
-
-class FileList;
-struct FileListEntry;
+#include "strategy/spelling-pairs.h"
 
 class ScanHandler : public FileEventHandler {
 public:
@@ -20,17 +18,21 @@ public:
 
 protected:
     // Fill a list with the children of the event's folder on one side. 0 or a negative ErrorCode;
-    // a folder that cannot be opened gives an empty list. The base has an empty destination.
+    // a folder that is gone or closed to us gives an empty list. The base has an empty destination.
     [[nodiscard]] virtual int GetSrcList(FileList& list);
     [[nodiscard]] virtual int GetDstList(FileList& list);
     // What to do about an entry that only the destination has, and about one that differs.
     virtual void IssueRemove(const FileListEntry& entry) = 0;
     virtual void IssueModify(const FileListEntry& src, const FileListEntry& dst) = 0;
+    // The entries that both sides have under names that differ. The base has none.
+    [[nodiscard]] virtual SpellingPairs FindSpellingPairs(const FileList& src_list,
+                                                          const FileList& dst_list);
     // Whether a pair of files with equal size and time may still hold different bytes.
     [[nodiscard]] virtual bool IsUnproven(const FileListEntry& dst);
 
-    // Issues the differences of the two lists, from the greatest name to the smallest.
-    // 0, or "Interrupted" when the run is aborted before a step.
+    // Issues the differences of the two lists, from the greatest name to the smallest. An entry
+    // with two names has its turn at the source's. 0, or "Interrupted" when the run is aborted
+    // before a step.
     [[nodiscard]] int GenerateEvent(const FileList& src_list, const FileList& dst_list);
     void IssueCopy(const FileListEntry& entry);
     void IssueScan(const FileListEntry& entry);

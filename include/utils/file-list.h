@@ -76,6 +76,9 @@ public:
     [[nodiscard]] int AddFileByPath(std::string_view path, uint32_t mtime, uint64_t size);
     [[nodiscard]] int AddDirByPath(std::string_view path, uint32_t mtime);
 
+    // False once a name was refused because the pool had no room for it: names may be missing then.
+    [[nodiscard]] bool HasRoom() const { return m_pool.HasRoom(); }
+
     [[nodiscard]] FileListIterator begin() const;
     [[nodiscard]] FileListIterator end() const;
 

@@ -53,7 +53,7 @@ struct FSDir {
     UniqueDir stream;
 };
 
-// 0, -1 on failure.
+// 0; -1 with errno on failure.
 [[nodiscard]] int FSOpenDir(const std::string& path, uint32_t flags, FSDir& handle);
 // 1 for an entry ("." and ".." among them), 0 at the end, -1 on failure: the rest of the folder is
 // then unknown. An entry that vanishes under way comes with the present time and size 0.
@@ -109,10 +109,12 @@ struct FSVisitor {
 };
 
 constexpr int FS_EACH_ABORTED = -1;   // the abort flag was set
-constexpr int FS_EACH_IO_ERROR = -2;  // a folder could not be read to its end; equals ERR_IO
+constexpr int FS_EACH_IO_ERROR = -2;  // a folder could not be listed to its end; equals ERR_IO
 
 // Lists the regular files and folders in `path` that pass the filter; "@eaDir" and all other kinds
-// are left out. A folder that cannot be opened is an empty one. `abort_flag` may be null.
+// are left out. A folder that is missing, no folder, behind a link or closed to us is an empty one;
+// any other failure to open it is an I/O error, and so is a list without room. `abort_flag` may be
+// null.
 // 0, FS_EACH_ABORTED or FS_EACH_IO_ERROR; after these the list is not the whole folder.
 [[nodiscard]] int FSForEachEntry(const std::string& path, const FSVisitor& visitor, unsigned flags,
                                  const std::atomic<int>* abort_flag, bool recursive);

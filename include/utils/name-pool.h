@@ -21,11 +21,14 @@ public:
     NamePool& operator=(const NamePool&) = delete;
 
     // Stores the name unless it is there; `out` is then its one address, with a NUL at the end.
-    // 0; -1 when all blocks are in use and none has room, and for a name with a NUL.
+    // 0; -1 when all blocks are in use and none has room, when there is no memory for another one,
+    // and for a name with a NUL.
     [[nodiscard]] int Add(std::string_view name, const char** out);
     // The address of a stored name, or null.
     [[nodiscard]] const char* Find(std::string_view name) const;
 
+    // False once a name was refused because there was no room or no memory for it.
+    [[nodiscard]] bool HasRoom() const { return m_has_room; }
     [[nodiscard]] size_t Size() const { return m_count; }
     [[nodiscard]] size_t BlockCount() const { return m_blocks.size(); }
 
@@ -50,4 +53,5 @@ private:
     std::vector<Block> m_blocks;
     std::vector<Slot> m_slots;  // open addressing; the size is a power of two
     size_t m_count = 0;
+    bool m_has_room = true;
 };

@@ -2,7 +2,9 @@
 #include <fcntl.h>
 #include <gmock/gmock.h>
 #include <linux/fs.h>
+#include <sched.h>
 #include <sys/ioctl.h>
+#include <sys/mount.h>
 #include <sys/resource.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -10,6 +12,7 @@
 #include <atomic>
 #include <filesystem>
 #include <thread>
+#include <utility>
 
 #include "deep-tree.h"
 #include "fake/fake-keld.h"
@@ -203,6 +206,54 @@ TEST_F(FSRemoveTest, AFolderThatCannotBeOpenedIsTold) {
     ASSERT_EQ(0, setrlimit(RLIMIT_NOFILE, &old));
     EXPECT_TRUE(m_log.Has("[ERR] Failed to open dir '" + (m_dir / "top/closed") + "'"));
     EXPECT_TRUE(fs::exists(m_dir / "top/closed/file"));
+}
+
+// A file system in memory, mounted on a folder for the length of a test.
+class MountedFolder {
+public:
+    explicit MountedFolder(std::string path) : m_path(std::move(path)) {
+        m_is_mounted = HasPrivateMounts() &&
+                       mount("none", m_path.c_str(), "tmpfs", 0, "size=1m,mode=755") == 0;
+    }
+    ~MountedFolder() { EXPECT_EQ(m_is_mounted ? 0 : -1, umount(m_path.c_str())); }
+    MountedFolder(const MountedFolder&) = delete;
+    MountedFolder& operator=(const MountedFolder&) = delete;
+
+    [[nodiscard]] bool IsMounted() const { return m_is_mounted; }
+
+private:
+    // Nobody else sees what is mounted.
+    static bool HasPrivateMounts() {
+        static const bool is_private =
+            unshare(CLONE_NEWNS) == 0 &&
+            mount("none", "/", nullptr, MS_REC | MS_PRIVATE, nullptr) == 0;
+        return is_private;
+    }
+
+    std::string m_path;
+    bool m_is_mounted;
+};
+
+TEST_F(FSRemoveTest, WhatIsMountedInAFolderStaysWithAllItHolds) {
+    m_dir.Write("top/a/1", "");
+    m_dir.Write("top/z/2", "");
+    const std::string mounted = m_dir.MakeDir("top/m/mounted");
+    const MountedFolder disk(mounted);
+    if (!disk.IsMounted()) GTEST_SKIP() << "mounting needs root";
+    m_dir.Write("top/m/3", "");
+    m_dir.Write("top/m/mounted/sub/file", "bytes");
+    EXPECT_EQ(-3, FSRemove(m_dir / "top"));
+    EXPECT_EQ("bytes", ReadWholeFile(mounted + "/sub/file"));
+    EXPECT_THAT(m_log.Lines(), testing::ElementsAre("[ERR] Failed to remove '" + mounted +
+                                                    "', another file system is mounted there"));
+    for (const char* name : {"top/a", "top/z", "top/m/3"}) EXPECT_FALSE(fs::exists(m_dir / name));
+
+    m_log.Clear();
+    EXPECT_EQ(-3, FSRemove(mounted)) << "nor is it emptied when it is meant itself";
+    EXPECT_EQ("bytes", ReadWholeFile(mounted + "/sub/file"));
+    EXPECT_TRUE(m_log.Contains("another file system is mounted there"));
+    EXPECT_EQ(0, FSRemove(mounted + "/sub")) << "within it a folder is like any other";
+    EXPECT_FALSE(fs::exists(mounted + "/sub"));
 }
 
 TEST_F(FSRemoveTest, AFolderThatIsSwappedForALinkDoesNotLeadTheRemovalOut) {

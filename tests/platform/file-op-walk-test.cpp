@@ -1,11 +1,14 @@
 // FSWalk, FSWalkTyped, FSForEachEntry, IsIgnored.
 #include <gmock/gmock.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
 #include <filesystem>
+#include <memory>
+#include <optional>
 
 #include "deep-tree.h"
 #include "fault-injection.h"
@@ -192,6 +195,55 @@ TEST_F(ForEachEntryTest, AFolderThatCannotBeOpenedIsAnEmptyOne) {
     EXPECT_EQ(0, m_result);
 }
 
+// While it lives the process may open nothing more.
+class NoDescriptors {
+public:
+    NoDescriptors() {
+        EXPECT_EQ(0, getrlimit(RLIMIT_NOFILE, &m_old));
+        rlimit none = m_old;
+        none.rlim_cur = 0;
+        EXPECT_EQ(0, setrlimit(RLIMIT_NOFILE, &none));
+    }
+    ~NoDescriptors() { EXPECT_EQ(0, setrlimit(RLIMIT_NOFILE, &m_old)); }
+    NoDescriptors(const NoDescriptors&) = delete;
+    NoDescriptors& operator=(const NoDescriptors&) = delete;
+
+private:
+    rlimit m_old{};
+};
+
+TEST_F(ForEachEntryTest, AFolderThatTheSystemCannotOpenNowIsNotAnEmptyOne) {
+    m_dir.Write("top/a", "");
+    m_dir.Write("top/file", "");
+    for (const bool is_confined : {false, true}) {
+        std::unique_ptr<ConfinedRoot> root;
+        if (is_confined) root = std::make_unique<ConfinedRoot>(m_dir.Path());
+        {
+            const NoDescriptors none;
+            List(m_dir / "top");
+        }
+        EXPECT_EQ(FS_EACH_IO_ERROR, m_result) << is_confined;
+        EXPECT_TRUE(m_log.Has("[ERR] FSOpenDir(" + (m_dir / "top") + ")"));
+        List(m_dir / std::string(256, 'x'));
+        EXPECT_EQ(FS_EACH_IO_ERROR, m_result) << is_confined;
+        EXPECT_TRUE(List(m_dir / "top/file").empty());
+        EXPECT_EQ(0, m_result) << is_confined;
+        EXPECT_EQ(2u, List(m_dir / "top").size());
+        EXPECT_EQ(0, m_result) << is_confined;
+    }
+}
+
+TEST_F(ForEachEntryTest, AFolderFurtherDownThatTheSystemCannotOpenEndsTheWalk) {
+    m_dir.Write("sub/a", "");
+    static std::optional<NoDescriptors> none;
+    const OnReadDir fill([](const char* name) {
+        if (std::string(name) == "sub") none.emplace();
+    });
+    List(m_dir.Path(), true);
+    none.reset();
+    EXPECT_EQ(FS_EACH_IO_ERROR, m_result);
+}
+
 TEST_F(ForEachEntryTest, AReadErrorIsNotTheEndOfTheFolder) {
     for (const char* name : {"a", "b", "c"}) m_dir.Write(name, "");
     const FailReadDir fail(3, EIO);
@@ -293,6 +345,21 @@ TEST_F(ForEachEntryTest, EntriesThatTheListRefusesAreLeftOut) {
     EXPECT_TRUE(m_log.Has("[ERR] FileProcessor (3): local list: add dir 'dir'"));
     EXPECT_EQ(2u, list.FileCount(0));
     EXPECT_EQ(0u, list.DirCount(0)) << "and a refused folder is not gone into";
+}
+
+TEST_F(ForEachEntryTest, AListWithoutRoomForANameIsNotTheWholeFolder) {
+    const std::string long_name(200, 'x');
+    for (const char* number : {"1", "2", "3"}) m_dir.Write("files/" + long_name + number, "");
+    for (const char* number : {"1", "2", "3"}) m_dir.MakeDir("folders/" + long_name + number);
+    for (const char* name : {"files", "folders"}) {
+        NamePool pool(1);
+        FileList list(pool);
+        m_visitor.list = &list;
+        EXPECT_EQ(FS_EACH_IO_ERROR,
+                  FSForEachEntry(m_dir / name, m_visitor, FS_EACH_STAT, nullptr, false))
+            << name;
+        EXPECT_EQ(2u, list.FileCount(0) + list.DirCount(0)) << name;
+    }
 }
 
 TEST_F(ForEachEntryTest, EntriesGoToTheFolderOfTheVisitor) {

@@ -1,10 +1,14 @@
 // The source goes only after its copy: flushed with its folder entries, read back from the medium
 // and found equal.
 #include <cerrno>
+#include <chrono>
 #include <cstdio>
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
+#include <functional>
+#include <thread>
+#include <utility>
 
 #include "db/task-info.h"
 #include "flush-faults.h"
@@ -28,6 +32,28 @@ protected:
         std::ofstream(path) << content;
         SetMtime(path, mtime);
     }
+    // File systems take the time from a clock that goes in steps of up to 10 ms.
+    static void PassATick() { std::this_thread::sleep_for(std::chrono::milliseconds(20)); }
+    // Runs once, when the next copy has been compared with its source and the source is about to
+    // go: that is when the device is asked for the first time after the copy.
+    void JustBeforeTheRemoval(std::function<void()> action) {
+        m_is_removal_near = false;
+        m_fake.OnCall("KELDFileCopy_r", [this] { m_is_removal_near = !m_has_acted; });
+        m_has_acted = false;
+        m_fake.OnCall("KELDDevIsPresent", [this, action] {
+            if (!std::exchange(m_is_removal_near, false)) return;
+            m_has_acted = true;
+            PassATick();
+            action();
+        });
+    }
+    [[nodiscard]] bool HasToldOfChange(const std::string& path) const {
+        return m_log.Has("[ERR] Source file '" + Src(path) +
+                         "' has changed since it was copied, it stays, should retry.");
+    }
+
+    bool m_is_removal_near = false;
+    bool m_has_acted = false;
 };
 
 TEST_F(IncBackupMoveTest, AMovedFileLeavesNoSourceAndNoRecord) {
@@ -245,6 +271,97 @@ TEST_F(IncBackupMoveTest, AFileSystemThatFlushesNoSingleFolderIsFlushedWhole) {
     EXPECT_EQ(0, HandleCopy("/a"));
     EXPECT_LE(1, whole);
     EXPECT_FALSE(IsThere(Src("/a")));
+}
+
+// --- A source that somebody writes to meanwhile ---
+
+TEST_F(IncBackupMoveTest, ASourceThatIsWrittenToAfterTheComparisonStays) {
+    const struct {
+        const char* what;
+        std::function<void(const std::string& path)> change;
+    } changes[] = {
+        {"written to",                  [](auto& path) { std::ofstream(path) << "newer"; }   },
+        {"written to, of its old date", [this](auto& path) { Scribble(path, "newer", 1000); }},
+        {"another file saved over it",
+         [this](auto& path) {
+             Scribble(m_dir / "saved", "newer", 1000);
+             fs::rename(m_dir / "saved", path);
+         }                                                                                   },
+        {"removed and made anew",
+         [this](auto& path) {
+             fs::remove(path);
+             Scribble(path, "newer", 1000);
+         }                                                                                   },
+    };
+    for (const auto& [what, change] : changes) {
+        WriteSrc("/a", "older", 1000);
+        JustBeforeTheRemoval([this, &change] { change(Src("/a")); });
+        EXPECT_EQ(ERR_FILE_OPERATION, HandleCopy("/a")) << what;
+        EXPECT_EQ("newer", ReadWholeFile(Src("/a"))) << what;
+        EXPECT_EQ("older", ReadWholeFile(Dst("/a"))) << what;
+        EXPECT_TRUE(HasToldOfChange("/a")) << what;
+        EXPECT_EQ(0, HandleCopy("/a")) << what;
+        EXPECT_FALSE(IsThere(Src("/a"))) << what;
+        EXPECT_EQ("newer", ReadWholeFile(Dst("/a"))) << what;
+        m_log.Clear();
+    }
+}
+
+// Whatever was noted of the first copy: the next attempt does not take it for that of the changed
+// file.
+TEST_F(IncBackupMoveTest, TheChangedSourceIsCopiedAnewAndThenGoes) {
+    for (const int policy : {CONFLICT_POLICY_OVERWRITE, CONFLICT_POLICY_RENAME}) {
+        for (const bool keeps_folders : {true, false}) {
+            for (const time_t mtime : {1000, 2000}) {
+                m_task.conflict_policy = policy;
+                SetNaming(keeps_folders, false, false);
+                WriteSrc("/a", "older", 1000);
+                JustBeforeTheRemoval([&] { Scribble(Src("/a"), "newer", mtime); });
+                RunTask();
+                EXPECT_TRUE(HasToldOfChange("/a"));
+                EXPECT_THAT(NamesOf(Src()), IsEmpty());
+                std::vector<std::string> contents;
+                for (const auto& entry : fs::directory_iterator(Dst())) {
+                    contents.push_back(ReadWholeFile(entry.path().string()));
+                }
+                EXPECT_THAT(contents, testing::Contains("newer"))
+                    << policy << " " << keeps_folders << " " << mtime;
+                m_log.Clear();
+                fs::remove_all(Dst());
+                fs::create_directory(Dst());
+            }
+        }
+    }
+}
+
+TEST_F(IncBackupMoveTest, ASourceThatIsSavedAnewDuringTheCopyLeavesNoNote) {
+    SetNaming(false, false, false);
+    WriteSrc("/a", "bytes", 1000);
+    {
+        // The same bytes: the comparison finds nothing.
+        const OnFlush faults([&](const std::string& what) {
+            if (what == Dst("/a")) {
+                PassATick();
+                Scribble(Src("/a"), "bytes", 1000);
+            }
+            return 0;
+        });
+        EXPECT_EQ(ERR_FILE_OPERATION, HandleCopy("/a"));
+    }
+    EXPECT_TRUE(HasToldOfChange("/a"));
+    EXPECT_TRUE(IsThere(Src("/a")));
+    EXPECT_EQ(0, m_task.file_db->IsDestinationTaken("/a"));
+    EXPECT_EQ(0, HandleCopy("/a"));
+    EXPECT_EQ(1, m_task.file_db->IsDestinationTaken("/a"));
+    EXPECT_FALSE(IsThere(Src("/a")));
+}
+
+TEST_F(IncBackupMoveTest, WhereSourcesStayAChangedOneIsNoFailure) {
+    m_task.remove_src_file = false;
+    WriteSrc("/a", "older", 1000);
+    m_fake.OnCall("KELDFileCopy_r", [this] { SetMtime(Src("/a"), 1000); });
+    EXPECT_EQ(0, HandleCopy("/a"));
+    EXPECT_TRUE(IsThere(Src("/a")));
 }
 
 // --- The order, as the system sees it ---

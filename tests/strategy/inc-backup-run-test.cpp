@@ -55,6 +55,20 @@ TEST_F(IncBackupRunTest, ASecondRunCopiesNothing) {
     EXPECT_EQ(0, TakeCopies());
 }
 
+TEST_F(IncBackupRunTest, ItNeverRotates) {
+    m_task.enable_rotation = true;
+    m_task.max_version_count = 1;
+    m_task.rotation_policy = ROTATION_POLICY_OLDEST;
+    for (const char* name : {"/Ferrix Copy_2020-01-01_000000/a", "/Ferrix Copy_2021-01-01_000000/a",
+                             "/Ferrix Copy_2022-01-01_000000.Bad/a"}) {
+        WriteSrc(name, name);
+    }
+    const std::vector<std::string> names = NamesOf(Src());
+    RunWell();
+    RunWell();
+    EXPECT_EQ(names, NamesOf(Dst()));
+}
+
 TEST_F(IncBackupRunTest, WhatIsMovedOrRemovedAtTheDestinationIsStillDone) {
     WriteSrc("/a", "1");
     WriteSrc("/b", "2");

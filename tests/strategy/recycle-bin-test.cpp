@@ -1,6 +1,7 @@
 #include "strategy/recycle-bin.h"
 
 #include <gmock/gmock.h>
+#include <unistd.h>
 
 #include "strategy-fixture.h"
 
@@ -100,6 +101,37 @@ TEST_F(RecycleBinTest, ADeviceThatIsAShareWithABinReceivesItsOwnFiles) {
     WriteSrc("/b.txt", "bytes");
     EXPECT_EQ(0, m_bin.RemoveFile(Src("/b.txt"), false));
     EXPECT_EQ("bytes", ReadWholeFile(m_usb + "/#recycle/data/b.txt"));
+}
+
+TEST_F(RecycleBinTest, ALinkGoesItselfAndWhatItLeadsToStays) {
+    const std::string file = m_dir.Write("elsewhere/file", "bytes");
+    for (const bool has_bin : {true, false}) {
+        m_fake.AddShare({.name = "photos", .path = m_share, .recycle_bin = has_bin});
+        for (const std::string& target : {file, m_dir / "elsewhere", std::string("nowhere")}) {
+            ASSERT_EQ(0, symlink(target.c_str(), Dst("/link").c_str()));
+            EXPECT_EQ(0, m_bin.RemoveFile(Dst("/link"), false)) << has_bin << " " << target;
+            EXPECT_FALSE(IsThere(Dst("/link"))) << has_bin << " " << target;
+            EXPECT_EQ("bytes", ReadWholeFile(file));
+            const std::string recycled = m_share + "/#recycle/copy/link";
+            EXPECT_EQ(has_bin, IsThere(recycled));
+            if (has_bin) {
+                char found[256] = "";
+                EXPECT_LT(0, readlink(recycled.c_str(), found, sizeof(found) - 1));
+                EXPECT_EQ(target, found);
+                ASSERT_EQ(0, unlink(recycled.c_str()));
+            }
+        }
+    }
+}
+
+TEST_F(RecycleBinTest, AShareThatDoesNotTellOfABinCountsAsOneWithout) {
+    EnableBin();
+    WriteDst("/b.txt", "x");
+    m_fake.FailCall("KLIBShareRecycleStatusGet");
+    EXPECT_EQ(0, m_bin.RemoveFile(Dst("/b.txt"), false));
+    EXPECT_FALSE(IsThere(Dst("/b.txt")));
+    EXPECT_THAT(m_fake.Recycled(), testing::IsEmpty());
+    EXPECT_TRUE(m_log.Has("[ERR] Failed to get share recycle bin status"));
 }
 
 TEST_F(RecycleBinTest, TheBinAndWhatLiesInItIsNeverRemoved) {

@@ -6,6 +6,7 @@
 #include <unistd.h>
 
 #include <atomic>
+#include <cerrno>
 
 #include "event/event-manager.h"
 #include "filter/file-filter.h"
@@ -269,6 +270,33 @@ TEST_F(ScanHandlerTest, AFolderThatBreaksInTheMiddleOfItsListingIssuesNothing) {
     }
     EXPECT_EQ(0, HandleScan("/"));
     EXPECT_THAT(TakeIssued(), ElementsAre("remove /d"));
+}
+
+TEST_F(ScanHandlerTest, AFolderThatTheSystemCannotOpenNowIssuesNothing) {
+    for (const char* name : {"/a", "/b"}) WriteDst(name, "s");
+    WriteSrc("/b", "s");
+    for (const int error : {EIO, EMFILE, ENFILE, ENOMEM, ESTALE, EINTR, ENODEV}) {
+        for (const int side : {0, 1}) {  // the source is listed first
+            const CloseFolder closed(side, error);
+            EXPECT_EQ(ERR_IO, HandleScan("/")) << side << " " << error;
+            EXPECT_THAT(TakeIssued(), IsEmpty()) << side << " " << error;
+        }
+    }
+    EXPECT_EQ(0, HandleScan("/"));
+    EXPECT_THAT(TakeIssued(), ElementsAre("remove /a"));
+}
+
+TEST_F(ScanHandlerTest, AFolderThatIsGoneOrClosedToUsIsAnEmptyOne) {
+    WriteSrc("/a", "s");
+    WriteDst("/a", "s");
+    for (const int error : {ENOENT, ENOTDIR, ELOOP, EACCES, EPERM}) {
+        for (const int side : {0, 1}) {
+            const CloseFolder closed(side, error);
+            EXPECT_EQ(0, HandleScan("/")) << side << " " << error;
+            EXPECT_THAT(TakeIssued(), ElementsAre(side == 0 ? "remove /a" : "copy /a"))
+                << side << " " << error;
+        }
+    }
 }
 
 // Gives the comparison two lists that no folder would, and sees what it asks for.

@@ -139,6 +139,37 @@ def test_an_export_copies_from_the_share_to_the_device(box):
     assert (answer["source_path"], answer["destination_path"]) == ("/photos/out", "/backup")
 
 
+def test_an_export_follows_names_that_change_their_case_alone(box):
+    """exFAT finds /a.txt under /A.txt too: renamed in case, files and folders stay on the device."""
+    share = box.add_share("photos")
+    rng = tree.rng(11)
+    for name in ("A.txt", "Changed.txt", "GONE.txt", "DCIM/Img.jpg", "DCIM/Sub/x", "Note/below"):
+        os.makedirs(os.path.dirname(f"{share}/out/{name}"), exist_ok=True)
+        tree.write(f"{share}/out/{name}", rng, 5000)
+    stick = box.add_device("stick", "exfat", 64)
+    stick.mount()
+    os.mkdir(stick.path("backup"))
+    box.start()
+    task = box.add_mirror(stick, folder="/out", usb_folder="/backup", export=True)
+    stick.hook("post_mount")
+    assert box.wait_run(task, 1) == "successful"
+    for old, new in (("A.txt", "a.txt"), ("Changed.txt", "changed.TXT"),
+                     ("DCIM/Img.jpg", "DCIM/img.JPG"), ("DCIM/Sub", "DCIM/sub"), ("DCIM", "dcim")):
+        os.rename(f"{share}/out/{old}", f"{share}/out/{new}")
+    tree.write(f"{share}/out/changed.TXT", rng, 6000)
+    os.remove(share + "/out/GONE.txt")
+    shutil.rmtree(share + "/out/Note")
+    tree.write(share + "/out/note", rng, 100)
+    for number in (2, 3):
+        mark = box.log.mark()
+        stick.hook("post_mount")
+        assert box.wait_run(task, number) == "successful"
+        left, right = tree.listing(share + "/out"), tree.listing(stick.path("backup"))
+        assert not tree.differences(left, right), tree.differences(left, right)
+        for line in ("CopyHandler: SetCopyFromFullPath", "RemoveFile: remove path"):
+            assert box.log.lacks(line, mark) == (number == 3), (number, line)
+
+
 def test_links_devices_and_pipes_are_left_alone(box):
     """Only files and folders are copied; a link is never followed, a pipe never waited for."""
     share, stick = prepare(box, files=5, folders=2)
