@@ -32,11 +32,11 @@ struct SubDir {
 
 bool IsSkipped(const std::string& name) { return name == "." || name == ".." || name == "@eaDir"; }
 
-// Whether the errno of opening a folder tells of the folder itself: it is gone, something else, or
-// closed to us. All others tell that the system could not look.
+// Whether the errno of opening a folder tells of the folder itself: it is gone, something else,
+// closed to us, or cannot be there under that name. All others tell that the system could not look.
 bool CountsAsEmpty(int error) {
     return error == ENOENT || error == ENOTDIR || error == ELOOP || error == EACCES ||
-           error == EPERM;
+           error == EPERM || error == ENAMETOOLONG || error == EILSEQ;
 }
 
 void LogDir(const FSVisitor& visitor, const std::string& name, int index) {

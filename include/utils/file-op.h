@@ -112,9 +112,9 @@ constexpr int FS_EACH_ABORTED = -1;   // the abort flag was set
 constexpr int FS_EACH_IO_ERROR = -2;  // a folder could not be listed to its end; equals ERR_IO
 
 // Lists the regular files and folders in `path` that pass the filter; "@eaDir" and all other kinds
-// are left out. A folder that is missing, no folder, behind a link or closed to us is an empty one;
-// any other failure to open it is an I/O error, and so is a list without room. `abort_flag` may be
-// null.
+// are left out. A folder that is missing or cannot be there, no folder, behind a link or closed to
+// us is an empty one; any other failure to open it is an I/O error, and so is a list without room.
+// `abort_flag` may be null.
 // 0, FS_EACH_ABORTED or FS_EACH_IO_ERROR; after these the list is not the whole folder.
 [[nodiscard]] int FSForEachEntry(const std::string& path, const FSVisitor& visitor, unsigned flags,
                                  const std::atomic<int>* abort_flag, bool recursive);

@@ -224,8 +224,8 @@ TEST_F(ForEachEntryTest, AFolderThatTheSystemCannotOpenNowIsNotAnEmptyOne) {
         }
         EXPECT_EQ(FS_EACH_IO_ERROR, m_result) << is_confined;
         EXPECT_TRUE(m_log.Has("[ERR] FSOpenDir(" + (m_dir / "top") + ")"));
-        List(m_dir / std::string(256, 'x'));
-        EXPECT_EQ(FS_EACH_IO_ERROR, m_result) << is_confined;
+        EXPECT_TRUE(List(m_dir / std::string(256, 'x')).empty()) << "no folder has that name";
+        EXPECT_EQ(0, m_result) << is_confined;
         EXPECT_TRUE(List(m_dir / "top/file").empty());
         EXPECT_EQ(0, m_result) << is_confined;
         EXPECT_EQ(2u, List(m_dir / "top").size());
