@@ -106,6 +106,13 @@ int CopyInto(int dir_fd, const char* name, int from, const struct stat& source,
     if (const int code = CopyData(from, file.Fd(), source, cancel); code != KELDERR_SUCCESS) {
         return code;
     }
+    // Before the name: a copy that is found after a crash is then known for what it is. Where it
+    // cannot be set, the caller, who sets the times, tells.
+    const timespec times[2] = {
+        {0, UTIME_OMIT},
+        source.st_mtim
+    };
+    static_cast<void>(futimens(file.Fd(), times));
     return file.Place(name, may_replace);
 }
 

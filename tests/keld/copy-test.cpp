@@ -262,6 +262,19 @@ TEST_F(KeldCopyTest, ASmallSourceThatIsRewrittenInPlaceIsNotTaken) {
     }
 }
 
+TEST_F(KeldCopyTest, ACopyHasTheTimeOfItsSourceWhenItGetsItsName) {
+    const timespec time{1'234'567'890, 123'456'789};
+    const timespec times[2] = {time, time};
+    for (const size_t size : {size_t{0}, size_t{100}, 20 * MIB}) {
+        const std::string from = MakeSource("f", TestBytes(size));
+        ASSERT_EQ(0, utimensat(AT_FDCWD, from.c_str(), times, 0));
+        ASSERT_EQ(KELDERR_SUCCESS, CopyAsking(from, Target("f"), [](int) { return false; }));
+        EXPECT_EQ(time.tv_sec, StatOf(Target("f")).st_mtim.tv_sec) << size;
+        EXPECT_EQ(time.tv_nsec, StatOf(Target("f")).st_mtim.tv_nsec) << size;
+        ASSERT_EQ(0, unlink(Target("f").c_str()));
+    }
+}
+
 TEST_F(KeldCopyTest, ASourceThatIsRemovedWhileItIsReadIsTakenWhole) {
     const std::string from = MakeSource("f", TestBytes(20 * MIB));
     EXPECT_EQ(KELDERR_SUCCESS, CopyAsking(from, Target("f"), [&](int count) {

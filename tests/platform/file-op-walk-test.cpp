@@ -195,7 +195,8 @@ TEST_F(ForEachEntryTest, AFolderThatCannotBeOpenedIsAnEmptyOne) {
     EXPECT_EQ(0, m_result);
 }
 
-// While it lives the process may open nothing more.
+// While it lives the process may open nothing more. What a sanitizer looks up when code runs for
+// the first time needs descriptors: the same call is made once before.
 class NoDescriptors {
 public:
     NoDescriptors() {
@@ -215,6 +216,7 @@ private:
 TEST_F(ForEachEntryTest, AFolderThatTheSystemCannotOpenNowIsNotAnEmptyOne) {
     m_dir.Write("top/a", "");
     m_dir.Write("top/file", "");
+    EXPECT_EQ(2u, List(m_dir / "top").size());
     for (const bool is_confined : {false, true}) {
         std::unique_ptr<ConfinedRoot> root;
         if (is_confined) root = std::make_unique<ConfinedRoot>(m_dir.Path());
@@ -235,6 +237,7 @@ TEST_F(ForEachEntryTest, AFolderThatTheSystemCannotOpenNowIsNotAnEmptyOne) {
 
 TEST_F(ForEachEntryTest, AFolderFurtherDownThatTheSystemCannotOpenEndsTheWalk) {
     m_dir.Write("sub/a", "");
+    EXPECT_EQ(2u, List(m_dir.Path(), true).size());
     static std::optional<NoDescriptors> none;
     const OnReadDir fill([](const char* name) {
         if (std::string(name) == "sub") none.emplace();

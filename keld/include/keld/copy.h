@@ -49,8 +49,8 @@ int KELDCopyTHRSetCallbackIsCancel(KELDCopyTHRArgs* args, KELDCopyIsCancel callb
  * The new file appears under its name in one step and whole, or not at all: after a failure, a
  * cancel or a crash `to` is what it was. It gets the permission bits of the source without setuid,
  * setgid and sticky bit, and the owner of the options where the file system has owners. Holes stay
- * holes where the file system has them. Time stamps are not copied. It is not yet on the disk: the
- * caller flushes.
+ * holes where the file system has them. The caller sets its time stamps; on plain Linux it has the
+ * source's time of change from the start. It is not yet on the disk: the caller flushes.
  *
  * No symbolic link is followed as the last component, and below the root of the share or device
  * that holds a path none at all. A source that changed while it was read is not taken: the copy
