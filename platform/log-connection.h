@@ -20,5 +20,6 @@ void SetLogSocketForTest(const char* path);
 // the log daemon takes them at once, for a few seconds. A line then tells how many were lost.
 void LogConnectionSend(const iovec* lines, size_t count);
 
-// The same for the handler of a crash signal: without taking a lock, and on an open connection only.
+// The same for the handler of a crash signal: without taking a lock, and on an open connection
+// only.
 void LogConnectionSendInCrash(const iovec* lines, size_t count);
